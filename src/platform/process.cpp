@@ -67,8 +67,14 @@ ProcessResult RunProcess(const std::vector<std::string>& argv, std::chrono::mill
   posix_spawn_file_actions_init(&actions);
   // The child starts with nothing on standard input.
   posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
+  // Its own process group, so a kill at the time-out also reaches what it started.
+  posix_spawnattr_t attributes;
+  posix_spawnattr_init(&attributes);
+  posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETPGROUP);
+  posix_spawnattr_setpgroup(&attributes, 0);
   pid_t pid = -1;
-  const int rc = posix_spawnp(&pid, args[0], &actions, nullptr, args.data(), environ);
+  const int rc = posix_spawnp(&pid, args[0], &actions, &attributes, args.data(), environ);
+  posix_spawnattr_destroy(&attributes);
   posix_spawn_file_actions_destroy(&actions);
   if (rc != 0) {
     result.start_error = rc;
@@ -91,7 +97,7 @@ ProcessResult RunProcess(const std::vector<std::string>& argv, std::chrono::mill
     std::this_thread::sleep_for(pause);
     pause = std::min(pause * 2, std::chrono::milliseconds(50));
   }
-  kill(pid, SIGKILL);
+  kill(-pid, SIGKILL);
   int status = 0;
   while (waitpid(pid, &status, 0) < 0 && errno == EINTR) {
   }

@@ -58,9 +58,8 @@ void CLockManager::LockWriter() {
   CreateWriterMutex();
   if (writer_lock_->LockWriter(Timeout(kWriterTimeoutMs)) != NamedLock::WaitResult::kTaken) {
     writer_lock_.reset();
-    throw CLockManagerException::Text(
-        "Timeout waiting for write access to an index. Lock name: %S", "LockWriter", nullptr,
-        lock_name_);
+    throw CLockManagerException::Text("Timeout waiting for write access to an index. Lock name: %S",
+                                      "LockWriter", nullptr, lock_name_);
   }
   writer_ = 1;
 }
@@ -100,8 +99,8 @@ void CLockManager::LockReader() {
   if (readers_->LockUnit(Timeout(kReaderUnitTimeoutMs)) != NamedLock::WaitResult::kTaken) {
     readers_.reset();
     throw CLockManagerException::Text(
-        "Timeout waiting for single read access to an index. Lock name: %S", "LockReader",
-        nullptr, lock_name_);
+        "Timeout waiting for single read access to an index. Lock name: %S", "LockReader", nullptr,
+        lock_name_);
   }
   reader_count_ = 1;
 }

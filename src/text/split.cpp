@@ -64,7 +64,6 @@ void CSplit::SplitW(std::u16string_view term) {
     CSplitPiece piece;
     piece.text = Unescape(term.substr(i, end - i));
     i = end;
-    if (piece.text.empty()) continue;  // only stray backslashes: nothing to match
     piece.kind = run_asterisk               ? SplitKind::kAfterAsterisk
                  : run_question_marks > 0   ? SplitKind::kAfterQuestionMarks
                                             : SplitKind::kLiteral;

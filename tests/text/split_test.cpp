@@ -3,94 +3,49 @@
 
 #include <string>
 
+#include "platform/text_encoding.h"
 #include "shared/exception_family.h"
 #include "text/split.h"
 
 namespace qm {
 namespace {
 
-using K = SplitKind;
-
-void ExpectPieces(const CSplit& s, std::initializer_list<CSplitPiece> expected) {
-  ASSERT_EQ(s.Pieces().size(), expected.size());
-  std::size_t i = 0;
-  for (const auto& e : expected) {
-    EXPECT_EQ(s.Pieces()[i].text, e.text) << "piece " << i;
-    EXPECT_EQ(s.Pieces()[i].kind, e.kind) << "piece " << i;
-    EXPECT_EQ(s.Pieces()[i].count, e.count) << "piece " << i;
-    ++i;
+// "start kind/count | piece kind/count:text ... | flags"
+std::string Describe(std::u16string_view term) {
+  CSplit s;
+  s.SplitW(term);
+  std::string out = std::to_string(static_cast<int>(s.StartKind())) + "/" + std::to_string(s.StartCount()) + " |";
+  for (const auto& p : s.Pieces()) {
+    out += " " + std::to_string(static_cast<int>(p.kind)) + "/" + std::to_string(p.count) + ":" + Utf16ToUtf8(p.text);
   }
+  out += " |";
+  if (s.TrailingAsterisk()) out += " *";
+  if (s.TrailingQuestionMarks()) out += " ?" + std::to_string(s.TrailingQuestionMarkCount());
+  if (s.IsPlainWord()) out += " plain";
+  return out;
 }
 
-TEST(SplitW, PlainWordsAndEmptyTerm) {
-  CSplit s;
-  s.SplitW(u"RIVER");
-  ExpectPieces(s, {{u"RIVER", K::kLiteral, 0}});
-  EXPECT_TRUE(s.IsPlainWord());
-  EXPECT_EQ(s.StartKind(), K::kLiteral);
-
-  s.SplitW(u"");
-  EXPECT_TRUE(s.Pieces().empty());
-  EXPECT_EQ(s.StartKind(), K::kLiteral);
-  EXPECT_FALSE(s.IsPlainWord());
-}
-
-TEST(SplitW, PiecesAndKinds) {
-  CSplit s;
-  s.SplitW(u"*RI??ER*S");
-  EXPECT_TRUE(s.LeadingAsterisk());
-  EXPECT_FALSE(s.TrailingAsterisk());
-  ExpectPieces(s, {{u"RI", K::kAfterAsterisk, 0}, {u"ER", K::kAfterQuestionMarks, 2}, {u"S", K::kAfterAsterisk, 0}});
-  EXPECT_FALSE(s.IsPlainWord());
-
-  s.SplitW(u"???AB");
-  EXPECT_EQ(s.StartKind(), K::kAfterQuestionMarks);
-  EXPECT_EQ(s.StartCount(), 3);
-  ExpectPieces(s, {{u"AB", K::kAfterQuestionMarks, 3}});
-
-  // A run with an asterisk in it matches any length.
-  s.SplitW(u"A?*?B");
-  ExpectPieces(s, {{u"A", K::kLiteral, 0}, {u"B", K::kAfterAsterisk, 2}});
-}
-
-TEST(SplitW, TrailingWildcards) {
-  CSplit s;
-  s.SplitW(u"RIVER*");
-  EXPECT_TRUE(s.TrailingAsterisk());
-  EXPECT_FALSE(s.TrailingQuestionMarks());
+TEST(SplitW, PiecesKindsAndFlags) {
+  EXPECT_EQ(Describe(u""), "3/0 | |");
+  EXPECT_EQ(Describe(u"RIVER"), "3/0 | 3/0:RIVER | plain");
+  EXPECT_EQ(Describe(u"*RI??ER*S"), "1/0 | 1/0:RI 2/2:ER 1/0:S |");
+  EXPECT_EQ(Describe(u"???AB"), "2/3 | 2/3:AB |");
+  // A run that holds an asterisk matches any length.
+  EXPECT_EQ(Describe(u"A?*?B"), "3/0 | 3/0:A 1/2:B |");
   // A prefix pattern is not an exact word.
-  EXPECT_FALSE(s.IsPlainWord());
-  ExpectPieces(s, {{u"RIVER", K::kLiteral, 0}});
-
-  // A single trailing question mark is kept: the term is not the word RIVE.
-  s.SplitW(u"RIVE?");
-  EXPECT_TRUE(s.TrailingQuestionMarks());
-  EXPECT_EQ(s.TrailingQuestionMarkCount(), 1);
-  EXPECT_FALSE(s.IsPlainWord());
-
-  s.SplitW(u"RIV???");
-  EXPECT_EQ(s.TrailingQuestionMarkCount(), 3);
-
-  s.SplitW(u"RIV?*?");
-  EXPECT_TRUE(s.TrailingAsterisk());
-  EXPECT_FALSE(s.TrailingQuestionMarks());
+  EXPECT_EQ(Describe(u"RIVER*"), "3/0 | 3/0:RIVER | *");
+  EXPECT_EQ(Describe(u"RIV?*?"), "3/0 | 3/0:RIV | *");
+  // A single trailing question mark is kept: RIVE? is not the word RIVE.
+  EXPECT_EQ(Describe(u"RIVE?"), "3/0 | 3/0:RIVE | ?1");
+  EXPECT_EQ(Describe(u"RIV???"), "3/0 | 3/0:RIV | ?3");
 }
 
 TEST(SplitW, EscapedWildcardsAreLiteral) {
-  CSplit s;
-  s.SplitW(u"A\\*B\\?C\\#D\\E");
-  ExpectPieces(s, {{u"A*B?C#DE", K::kLiteral, 0}});
-  EXPECT_TRUE(s.IsPlainWord());
-
-  // An escaped question mark at the end is not a trailing wildcard.
-  s.SplitW(u"WHY\\?");
-  EXPECT_FALSE(s.TrailingQuestionMarks());
-  EXPECT_TRUE(s.IsPlainWord());
-  ExpectPieces(s, {{u"WHY?", K::kLiteral, 0}});
-
-  s.SplitW(u"A\\??");
-  EXPECT_EQ(s.TrailingQuestionMarkCount(), 1);
-  ExpectPieces(s, {{u"A?", K::kLiteral, 0}});
+  EXPECT_EQ(Describe(u"A\\*B\\?C\\#D\\E"), "3/0 | 3/0:A*B?C#DE | plain");
+  EXPECT_EQ(Describe(u"WHY\\?"), "3/0 | 3/0:WHY? | plain");
+  EXPECT_EQ(Describe(u"A\\??"), "3/0 | 3/0:A? | ?1");
+  // A stray backslash still makes a piece: an empty one after the asterisk.
+  EXPECT_EQ(Describe(u"A*\\"), "3/0 | 3/0:A 1/0: |");
 }
 
 TEST(SplitW, MoreThanElevenPiecesIsAnError) {

@@ -24,10 +24,10 @@ std::size_t MatchKeyword(std::u16string_view text, std::size_t pos, std::u16stri
   return keyword.size();
 }
 
-// Where the value starting at pos ends. Inside double quotes a "" pair is part
-// of the value and the lone closing quote ends it; with blanks_end (outside
-// quotes in a statement) a blank ends it too.
-std::size_t ValueEnd(std::u16string_view text, std::size_t pos, bool quoted, bool blanks_end) {
+// Where the value starting at pos ends: at ";" or the end of a {...} value. In
+// a statement also at the double quote that closes the word (a "" pair inside
+// quotes is part of the value) and, outside quotes, at a blank.
+std::size_t ValueEnd(std::u16string_view text, std::size_t pos, bool quoted, bool statement) {
   if (pos < text.size() && text[pos] == u'{') {
     for (std::size_t i = pos + 1; i < text.size(); ++i) {
       if (text[i] != u'}') continue;
@@ -42,6 +42,7 @@ std::size_t ValueEnd(std::u16string_view text, std::size_t pos, bool quoted, boo
   for (std::size_t i = pos; i < text.size(); ++i) {
     const char16_t c = text[i];
     if (c == u';') return i;
+    if (!statement) continue;  // a connection string alone: only ";" ends a value
     if (c == u'"') {
       if (quoted && i + 1 < text.size() && text[i + 1] == u'"') {
         ++i;
@@ -49,7 +50,7 @@ std::size_t ValueEnd(std::u16string_view text, std::size_t pos, bool quoted, boo
       }
       return i;
     }
-    if (blanks_end && !quoted && IsBlank(c)) return i;
+    if (!quoted && IsBlank(c)) return i;
   }
   return text.size();
 }

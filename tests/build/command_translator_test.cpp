@@ -1,15 +1,13 @@
 #include <string>
-#include <vector>
 
-#include "build/command_locks.h"
 #include "translator_fixture.h"
 
 namespace qm::test {
 namespace {
 
-using Tags = TagMap;
-
 TEST_F(TranslatorTest, FindexDefinitionWithKeywordsInAnyCase) {
+  index_options.GeneralFlags = 3;
+  order_options.IgnoreChars = u"-";
   Translate("create findex Books on table books columns title:CONTENT_WEIGHT=3,body KEY id");
   EXPECT_EQ(cmd.CmdType(), kCmdFindexDefined);
   EXPECT_EQ(cmd.Create(), 1);
@@ -17,24 +15,28 @@ TEST_F(TranslatorTest, FindexDefinitionWithKeywordsInAnyCase) {
   EXPECT_EQ(findex.IndexName, "Books");
   EXPECT_EQ(findex.TableName, "books");
   EXPECT_EQ(findex.KeyColumn, "id");
-  EXPECT_EQ(findex.Columns, (ColumnMap{{"body", {}}, {"title", Tags{{"CONTENT_WEIGHT", "3"}}}}));
+  EXPECT_EQ(findex.Columns, (ColumnMap{{"body", {}}, {"title", {{"CONTENT_WEIGHT", "3"}}}}));
+  // The engine's current options go with every statement.
+  EXPECT_EQ(findex.GeneralFlags, 3);
+  EXPECT_EQ(order.IgnoreChars, u"-");
 }
 
 TEST_F(TranslatorTest, StoredDefinitionFormsSetCreateAndRebuild) {
   struct Case {
     const char* statement;
     int32_t type;
-    int16_t create;
-    int16_t rebuild;
+    int16_t create, rebuild;
   };
   for (const Case& c : {Case{"CREATE FINDEX Books", kCmdFindexStored, 1, 1},
                         Case{"UPDATE FINDEX Books", kCmdFindexStored, 0, 0},
                         Case{"UPDATE FINDEX Books REBUILD", kCmdFindexStored, 0, 1},
-                        Case{"update order ByTitle", kCmdOrderStored, 0, 0},
                         Case{"UPDATE ORDER ByTitle rebuild", kCmdOrderStored, 0, 1},
-                        Case{"UPDATE FINDEX Books ON TABLE t COLUMNS a KEY id", kCmdFindexDefined, 0, 0},
-                        Case{"UPDATE FINDEX Books ON TABLE t COLUMNS a KEY id REBUILD",
-                             kCmdFindexDefined, 0, 1}}) {
+                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id", kCmdFindexDefined, 0, 0},
+                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id REBUILD",
+                             kCmdFindexDefined, 0, 1},
+                        Case{"DROP FINDEX Books and more", kCmdDropFindex, 0, 0},
+                        Case{"drop order ByTitle", kCmdDropOrder, 0, 0},
+                        Case{"DROP THING x", kCmdNotRecognised, 0, 0}}) {
     SCOPED_TRACE(c.statement);
     Translate(c.statement);
     EXPECT_EQ(cmd.CmdType(), c.type);
@@ -43,91 +45,45 @@ TEST_F(TranslatorTest, StoredDefinitionFormsSetCreateAndRebuild) {
   }
 }
 
-TEST_F(TranslatorTest, ColumnWordsAreJoinedWithoutBlanks) {
-  Translate("CREATE FINDEX Books ON TABLE t COLUMNS a, b KEY id");
-  EXPECT_EQ(findex.Columns, (ColumnMap{{"a", {}}, {"b", {}}}));
+TEST_F(TranslatorTest, ColumnWordsAreJoinedWithoutBlanksAcrossLines) {
   Translate("CREATE FINDEX Books ON TABLE t COLUMNS a b KEY id");
-  EXPECT_EQ(findex.Columns, (ColumnMap{{"ab", {}}}));  // also: the earlier columns are gone
-}
-
-TEST_F(TranslatorTest, BlanksAroundEqualsAndLineBreaksDoNotMatter) {
+  EXPECT_EQ(findex.Columns, (ColumnMap{{"ab", {}}}));
   Translate("CREATE FINDEX Books\r\n\tON TABLE books\n  COLUMNS title:CONTENT_WEIGHT\n =\t3,\n"
             "  body:BASE_URL = \"http://host/docs/\"\nKEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdFindexDefined);
-  EXPECT_EQ(findex.Columns,
-            (ColumnMap{{"body", Tags{{"BASE_URL", "http://host/docs/"}}},
-                       {"title", Tags{{"CONTENT_WEIGHT", "3"}}}}));
+  EXPECT_EQ(findex.Columns, (ColumnMap{{"body", {{"BASE_URL", "http://host/docs/"}}},
+                                       {"title", {{"CONTENT_WEIGHT", "3"}}}}));
   // KEY = id becomes the one word KEY=id, so no KEY word is found.
   EXPECT_EQ(Refuse("CREATE FINDEX Books ON TABLE t COLUMNS title KEY = id").number, 13);
-}
-
-TEST_F(TranslatorTest, CurrentOptionsAreCopiedIntoTheDefinitions) {
-  index_options.Language = 5;
-  index_options.LanguageFlags = 1;
-  index_options.GeneralFlags = 3;
-  index_options.Separators = u"-_";
-  index_options.UpdateFlags = 1;
-  order_options.GeneralFlags = 1;
-  order_options.IgnoreChars = u"-";
-  Translate("UPDATE FINDEX Books");
-  EXPECT_EQ(findex.Language, 5);
-  EXPECT_EQ(findex.LanguageFlags, 1);
-  EXPECT_EQ(findex.GeneralFlags, 3);
-  EXPECT_EQ(findex.Separators, u"-_");
-  EXPECT_EQ(findex.UpdateFlags, 1);
-  EXPECT_EQ(order.GeneralFlags, 1);
-  EXPECT_EQ(order.IgnoreChars, u"-");
 }
 
 TEST_F(TranslatorTest, OrderColumnsKeepStatementOrder) {
   Translate("CREATE ORDER ByTitle ON TABLE books COLUMNS title, year,author KEY id");
   EXPECT_EQ(cmd.CmdType(), kCmdOrderDefined);
   EXPECT_EQ(order.OrderName, "ByTitle");
-  EXPECT_EQ(order.TableName, "books");
   EXPECT_EQ(order.KeyColumn, "id");
   EXPECT_EQ(order.ColumnNames(), "title,year,author");
 }
 
 TEST_F(TranslatorTest, PassThroughSqlKeepsTheHostsText) {
-  const std::string sql = "create index ix_title ON books (title)\n  WHERE kind = 'a = b' AND x = \"q";
+  const std::string sql = "create index ix ON books (title)\n  WHERE kind = 'a = b' AND x = \"q";
   Translate(sql);
   EXPECT_EQ(cmd.CmdType(), kCmdPassThroughSql);
   EXPECT_EQ(Utf16ToUtf8(cmd.PassThroughSql()), sql);
-  Translate("UPDATE INDEX x");
-  EXPECT_EQ(cmd.CmdType(), kCmdPassThroughSql);
   Translate("CREATE THING x");
   EXPECT_EQ(cmd.CmdType(), kCmdNotRecognised);
   EXPECT_TRUE(cmd.PassThroughSql().empty());
 }
 
-TEST_F(TranslatorTest, DropCommands) {
-  Translate("DROP FINDEX Books and more");
-  EXPECT_EQ(cmd.CmdType(), kCmdDropFindex);
-  EXPECT_EQ(findex.IndexName, "Books");
-  Translate("drop order ByTitle");
-  EXPECT_EQ(cmd.CmdType(), kCmdDropOrder);
-  EXPECT_EQ(order.OrderName, "ByTitle");
-  Translate("DROP THING x");
-  EXPECT_EQ(cmd.CmdType(), kCmdNotRecognised);
-}
-
 TEST_F(TranslatorTest, ConnectTakesDsnUserAndPassword) {
   Translate("CONNECT books_dsn EMPTY s3cret extra");
   EXPECT_EQ(cmd.CmdType(), kCmdConnect);
-  EXPECT_EQ(connection.Dsn, "books_dsn");
   EXPECT_EQ(connection.UserId, "");
   EXPECT_EQ(connection.Password, "s3cret");
   EXPECT_EQ(connection.Mode, ConnectionMode::Dsn);
   EXPECT_TRUE(connection.IsSet);
-
-  Translate("CONNECT \"My Books\" \"o\"\"brien\" \"p w\"");
+  Translate("CONNECT \"My Books\" \"o\"\"brien\"");
   EXPECT_EQ(connection.Dsn, "My Books");
   EXPECT_EQ(connection.UserId, "o\"brien");
-  EXPECT_EQ(connection.Password, "p w");
-
-  Translate("connect only_dsn");
-  EXPECT_EQ(connection.Dsn, "only_dsn");
-  EXPECT_EQ(connection.UserId, "");
   EXPECT_EQ(connection.Password, "");
 }
 
@@ -135,15 +91,12 @@ TEST_F(TranslatorTest, SetGroupAndConnectionString) {
   Translate("SET GROUP Sales");
   EXPECT_EQ(cmd.CmdType(), kCmdSetGroup);
   EXPECT_EQ(connection.Group, "Sales");
-
   connection.DisplayName = "old";
   Translate("set connectionstring \"Driver=SQLite3;Database=/data/my books.db;PWD=\"\"x\"\"\"");
   EXPECT_EQ(cmd.CmdType(), kCmdSetConnectionString);
   EXPECT_EQ(connection.ConnectionString, "Driver=SQLite3;Database=/data/my books.db;PWD=\"x\"");
   EXPECT_EQ(connection.DisplayName, "");
   EXPECT_EQ(connection.Mode, ConnectionMode::ConnectionString);
-  EXPECT_TRUE(connection.IsSet);
-
   // Unquoted blanks would silently cut the connection string.
   EXPECT_EQ(Refuse("SET CONNECTIONSTRING Driver=SQLite3;Database=/data/my books.db").number, 16);
 }
@@ -154,8 +107,8 @@ TEST_F(TranslatorTest, DeleteKeyIsReadInSixtyFourBits) {
     int32_t value;  // 0: refused with error 46
   };
   for (const Case& c : {Case{"17", 17}, Case{"-5", -5}, Case{"+42abc", 42},
-                        Case{"2147483647", 2147483647}, Case{"-2147483648", INT32_MIN},
-                        Case{"0", 0}, Case{"abc", 0}, Case{"-0", 0}, Case{"2147483648", 0},
+                        Case{"2147483647", INT32_MAX}, Case{"-2147483648", INT32_MIN},
+                        Case{"0", 0}, Case{"abc", 0}, Case{"2147483648", 0},
                         Case{"4294967297", 0}, Case{"-2147483649", 0},
                         Case{"99999999999999999999999999", 0}}) {
     SCOPED_TRACE(c.key);
@@ -167,7 +120,6 @@ TEST_F(TranslatorTest, DeleteKeyIsReadInSixtyFourBits) {
     Translate(statement);
     EXPECT_EQ(cmd.CmdType(), kCmdDeleteKey);
     EXPECT_EQ(cmd.DeleteKeyValue(), c.value);
-    EXPECT_EQ(findex.IndexName, "Books");
   }
   Translate("UPDATE FINDEX Books");
   EXPECT_EQ(cmd.DeleteKeyValue(), 0);  // each translation starts afresh
@@ -179,27 +131,20 @@ TEST_F(TranslatorTest, RefusedStatementsGiveTheirNumberedError) {
     int32_t number;
   };
   for (const Case& c : {
-           Case{"", 15}, Case{" \r\n\t ", 15},
-           Case{"CREATE", 13}, Case{"CREATE FINDEX", 13}, Case{"CREATE FINDEX b ON", 13},
-           Case{"CREATE FINDEX b ON TABLE", 13}, Case{"CREATE FINDEX b ON TABLE t", 13},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS a", 13},
+           Case{"", 15}, Case{" \r\n\t ", 15}, Case{"CREATE", 13}, Case{"CREATE FINDEX", 13},
+           Case{"CREATE FINDEX b ON TABLE t", 13}, Case{"CREATE FINDEX b ON TABLE t COLUMNS a", 13},
            Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY", 13},
-           Case{"CREATE FINDEX b REBUILD now", 13}, Case{"CREATE ORDER o REBUILD now", 13},
-           Case{"CREATE ORDER o ON TABLE t COLUMNS", 13}, Case{"CREATE FINDEX \"b", 13},
-           Case{"DROP", 13}, Case{"DROP FINDEX", 13}, Case{"DROP ORDER", 13},
-           Case{"CONNECT", 13}, Case{"SET", 13}, Case{"SET GROUP", 13},
-           Case{"SET COLOUR red", 13}, Case{"DELETE", 13}, Case{"DELETE FINDEX b 1", 13},
-           Case{"DELETE FROM ORDER b 1", 13}, Case{"DELETE FROM FINDEX b", 13},
+           Case{"CREATE FINDEX b REBUILD now", 13}, Case{"CREATE ORDER o ON TABLE t COLUMNS", 13},
+           Case{"CREATE FINDEX \"b", 13}, Case{"DROP FINDEX", 13}, Case{"CONNECT", 13},
+           Case{"SET GROUP", 13}, Case{"SET COLOUR red", 13}, Case{"DELETE FINDEX b 1", 13},
+           Case{"DELETE FROM FINDEX b", 13},
            Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY id x", 16},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY id REBUILD x", 16},
-           Case{"CREATE ORDER o ON TABLE t COLUMNS a KEY id NOW", 16},
-           Case{"DELETE FROM FINDEX Books 17 x", 16}, Case{"SET GROUP a b", 16},
+           Case{"CREATE ORDER o ON TABLE t COLUMNS a KEY id REBUILD x", 16},
+           Case{"DELETE FROM FINDEX Books 17 x", 16},
            Case{"CREATE FINDEX b ON TABLE t COLUMNS KEY id", 17},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS a,,b KEY id", 17},
            Case{"CREATE FINDEX b ON TABLE t COLUMNS a:WEIGHT KEY id", 17},
            Case{"CREATE ORDER o ON TABLE t COLUMNS a, KEY id", 17},
            Case{"CREATE FINDEX b AT TABLE t COLUMNS a KEY id", 18},
-           Case{"CREATE FINDEX b FROM", 18},
        }) {
     SCOPED_TRACE(c.statement);
     const Refusal r = Refuse(c.statement);
@@ -240,22 +185,10 @@ TEST_F(TranslatorTest, StatementOfMoreThanTwoHundredWordsIsRefusedWhole) {
     return s + " last KEY id";
   };
   Translate(statement_with_columns(190));  // 7 + 191 + 2 = 200 words
-  EXPECT_EQ(cmd.StatementWords(), 200u);
   EXPECT_EQ(findex.Columns.size(), 191u);
-  const Refusal r = Refuse(statement_with_columns(191));
-  EXPECT_EQ(r.text,
+  EXPECT_EQ(Refuse(statement_with_columns(191)).text,
             "Statement has too many words: 201 words found, at most 200 are allowed "
             "(Module:PiCmd,Method:TranslateW)\r\n");
-}
-
-TEST(CommandLockNames, PrefixFollowedDirectlyByTheName) {
-  EXPECT_EQ(CommandLockName(kCmdFindexStored, "Books"), "MORVIL_SYNCHRONIZE_CREATEBooks");
-  EXPECT_EQ(CommandLockName(kCmdFindexDefined, "Books"), "MORVIL_SYNCHRONIZE_CREATEBooks");
-  EXPECT_EQ(CommandLockName(kCmdOrderDefined, "ByT"), "MORVIL_SYNCHRONIZE_ORDERByT");
-  EXPECT_EQ(CommandLockName(kCmdDropFindex, "Books"), "MORVIL_SYNCHRONIZE_DROP_FINDEX_Books");
-  EXPECT_EQ(CommandLockName(kCmdDropOrder, "ByT"), "MORVIL_SYNCHRONIZE_DROP_ORDER_ByT");
-  EXPECT_EQ(CommandLockName(kCmdDeleteKey, "Books"), "MORVIL_SYNCHRONIZE_DELETE_Books");
-  EXPECT_EQ(CommandLockName(kCmdConnect, "Books"), "");
 }
 
 }  // namespace

@@ -63,11 +63,5 @@ TEST(ShippedErrorMessages, IniIsGeneratedFromTheReadableSource) {
   }
 }
 
-TEST(ShippedErrorMessages, FoundWithoutConfiguredSystemFolder) {
-  ConfiguredHome home;  // no "system" value configured
-  LoadErrorMessages();
-  EXPECT_LE(LookupErrorMessage(13).level, 100);
-}
-
 }  // namespace
 }  // namespace qm::test

@@ -6,8 +6,12 @@
 
 namespace qm {
 
+namespace {
+constexpr int32_t kColumnListRejected = 17;
+}  // namespace
+
 void ParseOrderColumns(std::u16string_view list, OrderColumnList& columns, const char* method) {
-  auto reject = [method] { return CPiCmdException::Numbered(17, method, nullptr); };
+  auto reject = [method] { return CPiCmdException::Numbered(kColumnListRejected, method, nullptr); };
   OrderColumnList parsed = Guard<CPiCmdException, CPiCmdUnknownException>("InsertIndexTags", [&] {
     OrderColumnList result;
     bool unterminated = false;

@@ -55,6 +55,21 @@ void WriteLineToModuleFile(const std::string& base, const std::string& line) {
 
 void SetTraceFileLimitForTesting(long long bytes) { g_file_limit = bytes; }
 
+std::string TraceDate(const std::tm& t) {
+  return std::to_string(t.tm_year + 1900) + "-" + std::to_string(t.tm_mon + 1) + "-" +
+         std::to_string(t.tm_mday);
+}
+
+std::string TraceLine(const std::tm& t, std::string_view area, std::string_view message) {
+  std::string line = TraceDate(t) + " " + std::to_string(t.tm_hour) + ":" +
+                     std::to_string(t.tm_min) + ":" + std::to_string(t.tm_sec) + " ";
+  line.append(area);
+  line += " - ";
+  line.append(message);
+  line += "\r\n";
+  return line;
+}
+
 void TraceMessage(std::string_view tag, std::string_view message) noexcept {
   try {
     const std::string home = HomeFolder();
@@ -67,14 +82,8 @@ void TraceMessage(std::string_view tag, std::string_view message) noexcept {
     const std::time_t now = std::time(nullptr);
     std::tm t{};
     localtime_r(&now, &t);
-    const std::string date = std::to_string(t.tm_year + 1900) + "-" + std::to_string(t.tm_mon + 1) +
-                             "-" + std::to_string(t.tm_mday);
-    std::string line = date + " " + std::to_string(t.tm_hour) + ":" + std::to_string(t.tm_min) +
-                       ":" + std::to_string(t.tm_sec) + " ";
-    line.append(area);
-    line += " - ";
-    line.append(message);
-    line += "\r\n";
+    const std::string date = TraceDate(t);
+    const std::string line = TraceLine(t, area, message);
 
     std::size_t start = 0;
     while (start <= modules.size()) {

@@ -1,8 +1,9 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
+
 #include <stdexcept>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "shared/core_test_support.h"
@@ -19,104 +20,68 @@ using Texts = std::vector<std::string>;
 const std::string kUnknown =
     "Unknown exception. This is a critical error, please report this problem to Morvil support";
 
-template <class E>
-std::pair<std::string, std::string> GeneralOf(const char* module) {
-  return {test::EntryTexts(E::General(nullptr)).at(0), module};
+template <class... E>
+std::vector<std::string> GeneralTexts() {
+  return {test::EntryTexts(E::General(nullptr)).at(0)...};
 }
 
 TEST(ExceptionFamily, EveryModuleNamesItselfInItsGeneralError) {
-  const std::pair<std::string, std::string> all[] = {
-      GeneralOf<CStreamException>("Stream"),
-      GeneralOf<CECComClientException>("ECComClient"),
-      GeneralOf<CSyncServersException>("SyncServers"),
-      GeneralOf<CPiStartPointException>("PiStartPoint"),
-      GeneralOf<CPiCmdException>("PiCmd"),
-      GeneralOf<CHighStructuresException>("HighStructures"),
-      GeneralOf<CPiFIndexException>("PiFIndex"),
-      GeneralOf<CPiOrderException>("PiOrder"),
-      GeneralOf<CWinFileException>("WinFile"),
-      GeneralOf<CPiDeleteException>("PiDelete"),
-      GeneralOf<CPiSortException>("PiSort"),
-      GeneralOf<CPiOrderSortException>("PiOrderSort"),
-      GeneralOf<CValueException>("Value"),
-      GeneralOf<CSTDFUNException>("STDFUN"),
-      GeneralOf<CCollectionException>("Collection"),
-      GeneralOf<CShareDatabaseException>("ShareDatabase"),
-      GeneralOf<CStringFuncUException>("StringFuncU"),
-      GeneralOf<CBFileException>("BFile"),
-      GeneralOf<CMFileException>("MFile"),
-      GeneralOf<CFreeItemException>("FreeItem"),
-      GeneralOf<CBlockException>("Block"),
-      GeneralOf<CGiStartPointException>("GiStartPoint"),
-      GeneralOf<CGiTreeRowsetException>("GiTreeRowset"),
-      GeneralOf<CGiCmdTreeException>("GiCmdTree"),
-      GeneralOf<CGiFIndexException>("GiFIndex"),
-      GeneralOf<CGiRepositoryException>("GiRepository"),
-      GeneralOf<CGiOrderException>("GiOrder"),
-      GeneralOf<CShareRepositoryException>("ShareRepository"),
-      GeneralOf<CShareCollectorException>("ShareCollector"),
-      GeneralOf<CShareDefinitionException>("ShareDefinition"),
-      GeneralOf<CLanguageException>("Language"),
-      GeneralOf<CDocConverterException>("DocConverter"),
-      GeneralOf<CComConverterException>("ComConverter"),
-      GeneralOf<CConnectionException>("Connection"),
-      GeneralOf<CConverterException>("Converter"),
-      GeneralOf<CLockManagerException>("LockManager"),
-  };
-  for (const auto& [text, module] : all) EXPECT_EQ(text, "General Error (Module:" + module + ")");
+  const std::vector<std::string> texts = GeneralTexts<
+      CStreamException, CECComClientException, CSyncServersException, CPiStartPointException,
+      CPiCmdException, CHighStructuresException, CPiFIndexException, CPiOrderException,
+      CWinFileException, CPiDeleteException, CPiSortException, CPiOrderSortException,
+      CValueException, CSTDFUNException, CCollectionException, CShareDatabaseException,
+      CStringFuncUException, CBFileException, CMFileException, CFreeItemException,
+      CBlockException, CGiStartPointException, CGiTreeRowsetException, CGiCmdTreeException,
+      CGiFIndexException, CGiRepositoryException, CGiOrderException, CShareRepositoryException,
+      CShareCollectorException, CShareDefinitionException, CLanguageException,
+      CDocConverterException, CComConverterException, CConnectionException, CConverterException,
+      CLockManagerException>();
+  const char* modules[] = {
+      "Stream", "ECComClient", "SyncServers", "PiStartPoint", "PiCmd", "HighStructures",
+      "PiFIndex", "PiOrder", "WinFile", "PiDelete", "PiSort", "PiOrderSort", "Value", "STDFUN",
+      "Collection", "ShareDatabase", "StringFuncU", "BFile", "MFile", "FreeItem", "Block",
+      "GiStartPoint", "GiTreeRowset", "GiCmdTree", "GiFIndex", "GiRepository", "GiOrder",
+      "ShareRepository", "ShareCollector", "ShareDefinition", "Language", "DocConverter",
+      "ComConverter", "Connection", "Converter", "LockManager"};
+  ASSERT_EQ(texts.size(), std::size(modules));
+  for (std::size_t i = 0; i < texts.size(); ++i) {
+    EXPECT_EQ(texts[i], "General Error (Module:" + std::string(modules[i]) + ")");
+  }
 }
 
-template <class U>
-void MakeUnknown() {
-  const U e = U::Unknown("Probe");
-  EXPECT_EQ(EntryTexts(e), Texts{kUnknown + " (Module:" + std::string(U::kModule) +
-                                 ",Method:Probe)"});
-  EXPECT_EQ(e.GetEntries().at(0).level, 100);
+// Builds one unknown exception of each class and returns the trace areas expected.
+template <class... U>
+std::vector<std::string> MakeUnknowns() {
+  std::vector<std::string> areas;
+  ([&] {
+    const U e = U::Unknown("Probe");
+    const std::string module(U::kModule);
+    EXPECT_EQ(EntryTexts(e), Texts{kUnknown + " (Module:" + module + ",Method:Probe)"});
+    EXPECT_EQ(e.GetEntries().at(0).level, 100);
+    areas.push_back(module == "GiTreeRowset" ? module : module + "UnknownException");
+  }(), ...);
+  return areas;
 }
 
 TEST(ExceptionFamily, UnknownExceptionsTraceUnderTheirTags) {
   test::ConfiguredHome home;
-  MakeUnknown<CStreamUnknownException>();
-  MakeUnknown<CECComClientUnknownException>();
-  MakeUnknown<CPiStartPointUnknownException>();
-  MakeUnknown<CPiCmdUnknownException>();
-  MakeUnknown<CHighStructuresUnknownException>();
-  MakeUnknown<CPiFIndexUnknownException>();
-  MakeUnknown<CPiOrderUnknownException>();
-  MakeUnknown<CPiSortUnknownException>();
-  MakeUnknown<CPiOrderSortUnknownException>();
-  MakeUnknown<CShareDatabaseUnknownException>();
-  MakeUnknown<CMFileUnknownException>();
-  MakeUnknown<CGiStartPointUnknownException>();
-  MakeUnknown<CGiTreeRowsetUnknownException>();
-  MakeUnknown<CGiCmdTreeUnknownException>();
-  MakeUnknown<CGiFIndexUnknownException>();
-  MakeUnknown<CGiRepositoryUnknownException>();
-  MakeUnknown<CGiOrderUnknownException>();
-  MakeUnknown<CShareRepositoryUnknownException>();
-  MakeUnknown<CShareCollectorUnknownException>();
-  MakeUnknown<CShareDefinitionUnknownException>();
-  MakeUnknown<CLanguageUnknownException>();
-  MakeUnknown<CDocConverterUnknownException>();
-  MakeUnknown<CComConverterUnknownException>();
-  MakeUnknown<CConnectionUnknownException>();
-  MakeUnknown<CConverterUnknownException>();
+  const auto engine_areas = MakeUnknowns<
+      CStreamUnknownException, CECComClientUnknownException, CPiStartPointUnknownException,
+      CPiCmdUnknownException, CHighStructuresUnknownException, CPiFIndexUnknownException,
+      CPiOrderUnknownException, CPiSortUnknownException, CPiOrderSortUnknownException,
+      CShareDatabaseUnknownException, CMFileUnknownException, CGiStartPointUnknownException,
+      CGiTreeRowsetUnknownException, CGiCmdTreeUnknownException, CGiFIndexUnknownException,
+      CGiRepositoryUnknownException, CGiOrderUnknownException, CShareRepositoryUnknownException,
+      CShareCollectorUnknownException, CShareDefinitionUnknownException,
+      CLanguageUnknownException, CComConverterUnknownException>();
+  const auto converter_areas = MakeUnknowns<CDocConverterUnknownException,
+                                            CConnectionUnknownException, CConverterUnknownException>();
+  EXPECT_EQ(converter_areas, (Texts{"DocConverterUnknownException", "ConnectionUnknownException",
+                                    "ConverterUnknownException"}));
+  EXPECT_NE(std::find(engine_areas.begin(), engine_areas.end(), "GiTreeRowset"), engine_areas.end());
 
   const std::string message = " - *** UNKNOWN EXCEPTION *** (Method:Probe)\r\n";
-  const std::vector<std::string> engine_areas = {
-      "StreamUnknownException",          "ECComClientUnknownException",
-      "PiStartPointUnknownException",    "PiCmdUnknownException",
-      "HighStructuresUnknownException",  "PiFIndexUnknownException",
-      "PiOrderUnknownException",         "PiSortUnknownException",
-      "PiOrderSortUnknownException",     "ShareDatabaseUnknownException",
-      "MFileUnknownException",           "GiStartPointUnknownException",
-      "GiTreeRowset",                    "GiCmdTreeUnknownException",
-      "GiFIndexUnknownException",        "GiRepositoryUnknownException",
-      "GiOrderUnknownException",         "ShareRepositoryUnknownException",
-      "ShareCollectorUnknownException",  "ShareDefinitionUnknownException",
-      "LanguageUnknownException",        "ComConverterUnknownException"};
-  const std::vector<std::string> converter_areas = {
-      "DocConverterUnknownException", "ConnectionUnknownException", "ConverterUnknownException"};
   for (const char* module : {"SHARELIB", "PILIB", "GILIB", "FILIB"}) {
     const std::string trace = test::TraceOf(home, module);
     for (const auto& areas : {engine_areas, converter_areas}) {
@@ -125,6 +90,7 @@ TEST(ExceptionFamily, UnknownExceptionsTraceUnderTheirTags) {
       }
     }
   }
+  // Only the converter-side classes also write to the REPLIB file.
   const std::string replib = test::TraceOf(home, "REPLIB");
   for (const auto& area : converter_areas) {
     EXPECT_NE(replib.find(" " + area + message), std::string::npos) << area;

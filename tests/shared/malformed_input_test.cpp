@@ -7,7 +7,6 @@
 #include <string_view>
 
 #include "platform/text_encoding.h"
-#include "shared/cwstr.h"
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 #include "shared/message_format.h"
@@ -73,22 +72,6 @@ TEST(MalformedInput, TokenizersAlwaysProgress) {
     EXPECT_TRUE(quoted.empty() || (quoted.front() != '"' && quoted.back() != '"')) << original;
     RemoveQuotes(quoted);
     EXPECT_EQ(quoted.find('"'), std::string::npos);
-  }
-}
-
-TEST(MalformedInput, TrimsRefuseOnlyOverlongText) {
-  Random rnd(2);
-  for (int round = 0; round < 200; ++round) {
-    std::string text = rnd.Text("  x\t", rnd.OneIn(4) ? 2100 : 60);
-    const bool too_long = text.size() > 1999;
-    try {
-      STrimLeft(text);
-      STrimRight(text);
-      EXPECT_FALSE(too_long);
-      EXPECT_TRUE(text.empty() || (text.front() != ' ' && text.back() != ' '));
-    } catch (const CSTDFUNException&) {
-      EXPECT_TRUE(too_long);
-    }
   }
 }
 
@@ -188,21 +171,6 @@ TEST(MalformedInput, ErrorMessageFilesOnlyYieldWellFormedEntries) {
       EXPECT_LE(entry.text.size(), 2047u);
       EXPECT_EQ(entry.text.find_first_of(u"\r\n"), std::u16string::npos);
     }
-  }
-}
-
-TEST(MalformedInput, WideStringSearchesAtAnyPosition) {
-  Random rnd(7);
-  for (int round = 0; round < kRounds; ++round) {
-    CWStr text(Utf8ToUtf16(rnd.Text("\\#*?ab()", 12)));
-    const std::size_t position = rnd.Below(16);
-    const bool special = text.IsSpecialAt(position, u"#*?(");
-    EXPECT_TRUE(!special || position < text.Length());
-    int index = 0;
-    const int at = text.FindInList({u"a", u"\\*", u"(b"}, index);
-    EXPECT_EQ(at == -1, index == -1);
-    text.StripEnclosing(u'(', u')');
-    EXPECT_LE(text.Length(), 12u);
   }
 }
 

@@ -39,8 +39,10 @@ void WriteLineToModuleFile(const std::string& base, const std::string& line) {
   const long long limit = g_file_limit.load();
   std::string path = base + ".log";
   for (int n = 1;; ++n) {
+    // O_NONBLOCK: a FIFO planted under a trace name fails the open instead of
+    // hanging the tracer; regular files ignore the flag.
     platform::FileHandle file =
-        platform::OpenFile(path, O_WRONLY | O_CREAT | O_APPEND, 0666);
+        platform::OpenFile(path, O_WRONLY | O_CREAT | O_APPEND | O_NONBLOCK, 0666);
     if (!file.IsOpen()) return;
     if (platform::FileSize(file.Get()) <= limit || n > 100000) {
       // One write() on an O_APPEND file: concurrent tracers never interleave.

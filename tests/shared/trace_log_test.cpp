@@ -1,6 +1,7 @@
 #include "shared/trace.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <filesystem>
 #include <regex>
@@ -110,6 +111,12 @@ TEST(TraceFailures, NothingIsWrittenOrThrownWithoutAUsableLogFolder) {
     // An exception built while its trace line cannot be written is intact.
     const auto e = CMFileUnknownException::Unknown("Read");
     EXPECT_EQ(e.GetEntries().size(), 1u);
+    // A FIFO in place of the day's file: no reader, so the line is dropped, not waited on.
+    fs::create_directories(home.Home() + "Log");
+    const std::string fifo = home.Home() + "Log/trace_FIFO_" + TraceDate(Today()) + ".log";
+    ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
+    Trace(true, "FIFO.A", "dropped");
+    fs::remove_all(home.Home() + "Log");
     test::WriteFile(home.Home() + "Log", "a file where the folder should be");
     Trace(true, "NOTADIR.A", "dropped");
     EXPECT_TRUE(fs::is_regular_file(home.Home() + "Log"));

@@ -35,25 +35,6 @@ std::string_view TrimBlanks(std::string_view s) {
 
 bool IsOn(std::string_view value) { return value == "1" || value == "true"; }
 
-// Reads the literal run and the optional group of pattern from position s,
-// comparing against w from position i + k; advances s and k.
-void MatchLiteralAndGroup(std::u16string_view pattern, std::u16string_view w, std::size_t i,
-                          std::size_t& s, int& k) {
-  while (CharAt(pattern, s) != 0 && CharAt(w, i + k) == CharAt(pattern, s) &&
-         !EndsLiteral(CharAt(pattern, s))) {
-    ++k;
-    ++s;
-  }
-  if (CharAt(pattern, s) == u'(') {
-    const char16_t c = CharAt(w, i + k);
-    if (IsLetter(c) && pattern.find(c, s + 1) != std::u16string_view::npos) {
-      ++k;
-      while (s < pattern.size() && pattern[s] != u')') ++s;
-      if (s < pattern.size()) ++s;
-    }
-  }
-}
-
 }  // namespace
 
 PhonetRules PhonetRules::Parse(std::string_view bytes) {
@@ -85,12 +66,7 @@ PhonetRules PhonetRules::Parse(std::string_view bytes) {
     } else if (key == "remove_accents") {
       rules.remove_accents_ = IsOn(value);
     } else {
-      Rule rule;
-      rule.pattern = Latin1(key);
-      if (value != "_") rule.replacement = Latin1(value);
-      rule.rewrites = rule.pattern.find(u'<', 1) != std::u16string::npos;
-      rule.restarts = rule.pattern.find(u"^^", 1) != std::u16string::npos;
-      rules.rules_.push_back(std::move(rule));
+      rules.rules_.push_back(Compile(Latin1(key), value == "_" ? u"" : Latin1(value)));
     }
   }
   // Only the first run of consecutive rules for a character is ever used.
@@ -102,67 +78,129 @@ PhonetRules PhonetRules::Parse(std::string_view bytes) {
     while (m < count && rules.rules_[static_cast<std::size_t>(m)].pattern[0] == c) ++m;
     if (!seen[c]) {
       seen[c] = true;
-      rules.runs_[c] = Run{n, m};
+      rules.runs_[c] = Run{n, m, -1};
     }
     n = m;
   }
+  rules.BuildCandidates();
   return rules;
 }
 
-bool PhonetRules::MatchAt(const Rule& rule, std::u16string_view w, std::size_t i,
-                          Match& m) const {
-  const std::u16string_view p = rule.pattern;
+void PhonetRules::BuildCandidates() {
+  int32_t slots = 0;
+  for (Run& run : runs_) {
+    if (run.begin == run.end) continue;
+    run.slot = slots++;
+    for (int bucket = 0; bucket < kBuckets; ++bucket) {
+      bucket_starts_.push_back(static_cast<uint32_t>(candidates_.size()));
+      for (int32_t n = run.begin; n < run.end; ++n) {
+        const std::u16string& literal = rules_[static_cast<std::size_t>(n)].literal;
+        if (literal.empty() || literal[0] == bucket) candidates_.push_back(n);
+      }
+    }
+    bucket_starts_.push_back(static_cast<uint32_t>(candidates_.size()));
+  }
+}
+
+PhonetRules::Candidates PhonetRules::CandidatesFor(const Run& run, char16_t next) const {
+  const std::size_t at = static_cast<std::size_t>(run.slot) * (kBuckets + 1) +
+                         (next < kBuckets - 1 ? next : kBuckets - 1);
+  return {candidates_.data() + bucket_starts_[at], candidates_.data() + bucket_starts_[at + 1]};
+}
+
+PhonetRules::Rule PhonetRules::Compile(std::u16string pattern, std::u16string replacement) {
+  Rule rule;
+  const std::u16string_view p = pattern;
   std::size_t s = 1;
-  int k = 1;
-  MatchLiteralAndGroup(p, w, i, s, k);
-  m.has_dash = CharAt(p, s) == u'-';
-  m.full = k;
-  while (CharAt(p, s) == u'-' && k > 1) {
-    --k;
+  while (s < p.size() && !EndsLiteral(p[s])) ++s;
+  rule.literal = p.substr(1, s - 1);
+  if (CharAt(p, s) == u'(') {
+    rule.has_group = true;
+    rule.group = p.substr(s + 1);
+    s = p.find(u')', s);
+    s = s == std::u16string_view::npos ? p.size() : s + 1;
+  }
+  while (CharAt(p, s) == u'-') {
+    ++rule.dashes;
     ++s;
   }
-  m.consumed = k;
   if (CharAt(p, s) == u'<') ++s;
-  m.priority = 5;
   if (IsDigit(CharAt(p, s))) {
-    m.priority = CharAt(p, s) - u'0';
+    rule.priority = CharAt(p, s) - u'0';
     ++s;
   }
-  if (CharAt(p, s) == u'^' && CharAt(p, s + 1) == u'^') ++s;
+  // Anything but an anchor or the end left here makes a rule that never matches.
   const char16_t rest = CharAt(p, s);
-  if (rest == 0) return true;
-  const std::size_t after = i + static_cast<std::size_t>(m.full);
-  if (rest == u'^') {
-    return (i == 0 || !IsLetter(w[i - 1])) &&
-           (CharAt(p, s + 1) != u'$' || !IsLetter(CharAt(w, after)));
+  rule.follow_anchor = rest == 0 ? Anchor::kAnywhere : rest == u'$' ? Anchor::kEnd : Anchor::kNever;
+  if (rest == u'^' && CharAt(p, s + 1) == u'^') ++s;
+  if (rest == 0) {
+    rule.anchor = Anchor::kAnywhere;
+  } else if (rest == u'^') {
+    rule.anchor = CharAt(p, s + 1) == u'$' ? Anchor::kWholeWord : Anchor::kStart;
+  } else if (rest == u'$') {
+    rule.anchor = Anchor::kEnd;
   }
-  if (rest == u'$') return i > 0 && IsLetter(w[i - 1]) && !IsLetter(CharAt(w, after));
+  rule.rewrites = p.find(u'<', 1) != std::u16string_view::npos;
+  rule.restarts = p.find(u"^^", 1) != std::u16string_view::npos;
+  rule.pattern = std::move(pattern);
+  rule.replacement = std::move(replacement);
+  return rule;
+}
+
+int PhonetRules::MatchLetters(const Rule& rule, std::u16string_view w, std::size_t from) {
+  const std::size_t n = rule.literal.size();
+  if (from + n > w.size() || w.compare(from, n, rule.literal) != 0) return -1;
+  if (!rule.has_group) return static_cast<int>(n);
+  const char16_t c = CharAt(w, from + n);
+  if (!IsLetter(c) || rule.group.find(c) == std::u16string::npos) return -1;
+  return static_cast<int>(n) + 1;
+}
+
+bool PhonetRules::MatchAt(const Rule& rule, std::u16string_view w, std::size_t i, Match& m) {
+  if (rule.anchor == Anchor::kNever) return false;
+  const int letters = MatchLetters(rule, w, i + 1);
+  if (letters < 0) return false;
+  m.full = letters + 1;
+  // Dashes never take the match below one letter; a dash beyond that fails it.
+  if (rule.dashes > m.full - 1) return false;
+  m.consumed = m.full - rule.dashes;
+  const bool ends = !IsLetter(CharAt(w, i + static_cast<std::size_t>(m.full)));
+  const bool starts = i == 0 || !IsLetter(w[i - 1]);
+  switch (rule.anchor) {
+    case Anchor::kAnywhere:
+      return true;
+    case Anchor::kStart:
+      return starts;
+    case Anchor::kWholeWord:
+      return starts && ends;
+    case Anchor::kEnd:
+      return !starts && ends;  // so never at the first position
+    case Anchor::kNever:
+      break;
+  }
   return false;
 }
 
-int PhonetRules::Veto(std::u16string_view w, std::size_t i, const Match& m) const {
+int PhonetRules::Veto(const Rule& rule, std::u16string_view w, std::size_t i,
+                      const Match& m) const {
   const auto k = static_cast<std::size_t>(m.consumed);
-  if (!followup_ || m.consumed <= 1 || m.has_dash || i + k >= w.size()) return -1;
+  if (!followup_ || m.consumed <= 1 || rule.dashes > 0 || i + k >= w.size()) return -1;
   const char16_t last = w[i + k - 1];
   if (last > 0xFF) return -1;
-  const Run run = runs_[last];
-  for (int32_t n = run.begin; n < run.end; ++n) {
-    const std::u16string_view p = rules_[static_cast<std::size_t>(n)].pattern;
-    std::size_t s = 1;
-    int k2 = m.consumed;
-    MatchLiteralAndGroup(p, w, i, s, k2);
-    while (CharAt(p, s) == u'-') ++s;
-    if (CharAt(p, s) == u'<') ++s;
-    int priority = 5;
-    if (IsDigit(CharAt(p, s))) {
-      priority = CharAt(p, s) - u'0';
-      ++s;
+  const Run& run = runs_[last];
+  if (run.slot < 0) return -1;
+  const Candidates candidates = CandidatesFor(run, w[i + k]);
+  for (const int32_t* n = candidates.begin; n != candidates.end; ++n) {
+    const Rule& next = rules_[static_cast<std::size_t>(*n)];
+    if (next.follow_anchor == Anchor::kNever) continue;
+    const int letters = MatchLetters(next, w, i + k);
+    // It must cover more than the current rule and rank no lower.
+    if (letters <= 0 || next.priority < rule.priority) continue;
+    if (next.follow_anchor == Anchor::kEnd &&
+        IsLetter(CharAt(w, i + k + static_cast<std::size_t>(letters)))) {
+      continue;
     }
-    const char16_t rest = CharAt(p, s);
-    const bool fits = rest == 0 ||
-                      (rest == u'$' && !IsLetter(CharAt(w, i + static_cast<std::size_t>(k2))));
-    if (!fits || k2 == m.consumed || priority < m.priority) continue;
-    return priority;
+    return next.priority;
   }
   return -1;
 }
@@ -188,7 +226,7 @@ void PhonetRules::Encode(std::u16string_view word, std::size_t cap, std::u16stri
       rewrote = copy_if_no_rules = false;
       continue;
     }
-    const Run run = runs_[c];
+    const Run& run = runs_[c];
     if (run.begin == run.end) {
       if (copy_if_no_rules) append_checked(c);
       ++i;
@@ -199,13 +237,15 @@ void PhonetRules::Encode(std::u16string_view word, std::size_t cap, std::u16stri
     const Rule* chosen = nullptr;
     Match m;
     bool last_vetoed_at_zero = false;
-    for (int32_t n = run.begin; n < run.end; ++n) {
-      const Rule& rule = rules_[static_cast<std::size_t>(n)];
+    const Candidates candidates = CandidatesFor(run, i + 1 < w.size() ? w[i + 1] : 0);
+    for (const int32_t* n = candidates.begin; n != candidates.end; ++n) {
+      const Rule& rule = rules_[static_cast<std::size_t>(*n)];
       last_vetoed_at_zero = false;
       if (!MatchAt(rule, w, i, m)) continue;
-      const int veto = Veto(w, i, m);
+      const int veto = Veto(rule, w, i, m);
       if (veto >= 0) {
-        last_vetoed_at_zero = veto == 0;
+        // Only the run's very last rule counts; the rules skipped after it never match.
+        last_vetoed_at_zero = veto == 0 && *n == run.end - 1;
         continue;
       }
       chosen = &rule;

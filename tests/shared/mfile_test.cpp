@@ -2,6 +2,7 @@
 // failure it reports.
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -21,226 +22,169 @@ using test::RaisedText;
 
 class MFileTest : public ::testing::Test {
  protected:
-  std::string PathOf(const std::string& name) const { return dir_.Path() + name; }
-  int64_t DiskSize(const std::string& path) const {
-    return static_cast<int64_t>(test::ReadFile(path).size());
-  }
+  std::string Path(const std::string& name) const { return dir_.Path() + name; }
+  std::size_t OnDisk(const std::string& name) const { return test::ReadFile(Path(name)).size(); }
   test::ScratchDir dir_{"mfile"};
 };
 
-TEST_F(MFileTest, SmallWritesAreGatheredAndAWriteThatWouldOverflowCommitsFirst) {
-  const std::string path = PathOf("gather.bin");
+TEST_F(MFileTest, WritesAreGatheredUntilTheBufferWouldOverflow) {
   MFile f;
-  f.OpenFile(path, MFile::kCreate);
-  const std::string a(4999, 'a');
+  f.OpenFile(Path("w"), MFile::kCreate);
+  const std::string a(4999, 'a'), full(5000, 'f'), big(6000, 'b');
   f.mwrite(a.data(), a.size());
-  EXPECT_EQ(DiskSize(path), 0);
+  EXPECT_EQ(OnDisk("w"), 0u);
   f.mwrite("bc", 2);
-  EXPECT_EQ(DiskSize(path), 4999);  // one platform write of the 4,999 bytes
+  EXPECT_EQ(OnDisk("w"), 4999u);  // one platform write of the 4,999 bytes
   f.MCommit();
-  EXPECT_EQ(DiskSize(path), 5001);
-  f.MCommit();  // nothing new: nothing more is written
-  EXPECT_EQ(DiskSize(path), 5001);
-  f.Close();
-  EXPECT_EQ(test::ReadFile(path), a + "bc");
-}
-
-TEST_F(MFileTest, AWriteOfExactlyTheBufferIsGatheredAndALargerOneGoesStraightThrough) {
-  const std::string path = PathOf("large.bin");
-  MFile f;
-  f.OpenFile(path, MFile::kCreate);
-  const std::string full(MFile::kBufferSize, 'f');
+  f.MCommit();  // nothing new: nothing more written
+  EXPECT_EQ(OnDisk("w"), 5001u);
   f.mwrite(full.data(), full.size());
-  EXPECT_EQ(DiskSize(path), 0);
-  f.MCommit();
-  f.mwrite("0123456789", 10);
-  const std::string big(6000, 'b');
-  f.mwrite(big.data(), big.size());
-  EXPECT_EQ(DiskSize(path), 5000 + 10 + 6000);
-  f.Close();
-  EXPECT_EQ(test::ReadFile(path), full + "0123456789" + big);
+  EXPECT_EQ(OnDisk("w"), 5001u);
+  f.mwrite(big.data(), big.size());  // commits the buffer, then goes straight through
+  EXPECT_EQ(test::ReadFile(Path("w")), a + "bc" + full + big);
 }
 
-TEST_F(MFileTest, CommitNeverWritesBytesThatWereOnlyRead) {
-  const std::string path = PathOf("read-then-write.bin");
-  test::WriteFile(path, "ABCDEFGHIJ");
+TEST_F(MFileTest, ReadsWritesSeeksAndTakeOverKeepTheLogicalPosition) {
+  test::WriteFile(Path("p"), "ABCDEFGHIJ");
   MFile f;
-  f.OpenFile(path, MFile::kOpenOrCreate);
-  char got[3];
-  ASSERT_EQ(f.mread(got, 3), 3u);
+  f.OpenFile(Path("p"), MFile::kOpenOrCreate);
+  char c[3];
+  ASSERT_EQ(f.mread(c, 3), 3u);
+  f.MCommit();  // bytes only read are never written back
+  EXPECT_EQ(test::ReadFile(Path("p")), "ABCDEFGHIJ");
+  f.mwrite("xy", 2);  // lands behind what was read, not behind the read-ahead
   f.MCommit();
-  EXPECT_EQ(test::ReadFile(path), "ABCDEFGHIJ");
-  // A write after reads lands at the logical position, not behind the read-ahead.
-  f.mwrite("xy", 2);
-  f.MCommit();
-  EXPECT_EQ(test::ReadFile(path), "ABCxyFGHIJ");
-  char next = 0;
-  ASSERT_EQ(f.mread(&next, 1), 1u);
-  EXPECT_EQ(next, 'F');
-}
-
-TEST_F(MFileTest, SeekDiscardsTheReadBufferAndCommitsPendingWrites) {
-  const std::string path = PathOf("seek.bin");
-  test::WriteFile(path, "ABCDEFGHIJ");
-  MFile f;
-  f.OpenFile(path, MFile::kOpenOrCreate);
-  char c = 0;
-  f.mread(&c, 1);
-  f.Seek(6);
-  f.mread(&c, 1);
-  EXPECT_EQ(c, 'G');
+  f.mread(c, 1);
+  EXPECT_EQ(c[0], 'F');
+  f.Seek(8);  // the read buffer of the old position is dropped
+  f.mread(c, 1);
+  EXPECT_EQ(c[0], 'I');
   f.Seek(0);
-  f.mwrite("zz", 2);
-  f.SeekToEnd();
-  EXPECT_EQ(test::ReadFile(path), "zzCDEFGHIJ");
-  f.mwrite("!", 1);
+  f.mwrite("z", 1);
   EXPECT_EQ(f.FileSize(false), 10);
-  EXPECT_EQ(f.FileSize(true), 11);
+  f.SeekToEnd();
+  EXPECT_EQ(test::ReadFile(Path("p")), "zBCxyFGHIJ");
+
+  f.Seek(1);
+  f.mread(c, 1);
+  MFile g;
+  g.TakeOver(f);
+  EXPECT_FALSE(f.IsOpen());
+  g.mread(c, 1);
+  EXPECT_EQ(c[0], 'C');
+  g.mwrite("12", 2);  // pending when handed on
+  MFile h;
+  h.TakeOver(g);
+  h.mwrite("3", 1);
+  h.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("p")), "zBC123GHIJ");
+  EXPECT_EQ(h.GetMode(), MFile::kOpenOrCreate);
 }
 
-TEST_F(MFileTest, ReadsAcrossRefillsAndReportsTheEnd) {
-  const std::string path = PathOf("refill.bin");
+TEST_F(MFileTest, EndOfFile) {
   std::string content;
-  for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 26));
-  test::WriteFile(path, content);
+  for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 23));
+  test::WriteFile(Path("e"), content);
   MFile f;
-  f.OpenFile(path, MFile::kReadOnly);
-  std::string got(7000, '\0');
-  ASSERT_EQ(f.mread(got.data(), 7000), 7000u);
-  EXPECT_EQ(got, content.substr(0, 7000));
-  ASSERT_EQ(f.mread(got.data(), 5000), 5000u);
-  EXPECT_EQ(got.substr(0, 5000), content.substr(7000));
-  EXPECT_TRUE(f.IsEOF());
-  EXPECT_EQ(f.mread(got.data(), 1), 0u);
-}
-
-TEST_F(MFileTest, AReadThatRunsPastTheEndRaises) {
-  const std::string path = PathOf("short.bin");
-  test::WriteFile(path, "1234");
-  MFile f;
-  f.OpenFile(path, MFile::kReadOnly);
-  char buffer[10];
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(buffer, 10); }),
+  f.OpenFile(Path("e"), MFile::kReadOnly);
+  std::string got(11996, '\0');
+  ASSERT_EQ(f.mread(got.data(), got.size()), got.size());  // across refills
+  EXPECT_EQ(got, content.substr(0, got.size()));
+  char rest[10];
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(rest, 10); }),
             "EOF error reading from disk (Module:MFile,Method:mread)");
-  EXPECT_FALSE(f.mrefill(true));
+  EXPECT_TRUE(f.IsEOF());
+  EXPECT_EQ(f.mread(rest, 1), 0u);
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.mrefill(false); }),
             "EOF error reading from disk (Module:MFile,Method:mread)");
 }
 
 TEST_F(MFileTest, TypedItemsRoundTripInTheirByteLayout) {
-  const std::string path = PathOf("typed.bin");
-  DateTimeValue date{2004, 3, 9, 14, 5, 7, 123456};
-  {
-    MFile f;
-    f.OpenFile(path, MFile::kCreate);
-    f.WriteStr(CWStr(u"ab"));
-    f.WriteByte(0xFE);
-    f.WriteShort(-2);
-    f.WriteInt(-100000);
-    f.WriteDouble(2.5);
-    f.WriteDate(date);
-    f.WriteStr(std::string_view("xyz"));
-    f.WriteStrW(u"\u00e9\u4e2d");
-    const int32_t row[] = {7, -8};
-    f.WriteItemRow(row);
-    CValue text;
-    text.SetText("naïve");
-    f.WriteValue(text);
-    CValue wide;
-    wide.SetTextW(u"w\u00fc");
-    f.WriteValue(wide);
-    CValue number;
-    number.SetInteger(42);
-    f.WriteValue(number);
-    CValue when;
-    when.SetDateTime(date);
-    f.WriteValue(when);
-    f.MCommit();
-    f.Close();
-  }
-  const std::string bytes = test::ReadFile(path);
-  EXPECT_EQ(bytes.substr(0, 6), std::string("\x02\x00\x61\x00\x62\x00", 6));
-  EXPECT_EQ(bytes.substr(7, 2), std::string("\xFE\xFF", 2));
-  EXPECT_EQ(bytes.substr(21, 16),
-            std::string("\xD4\x07\x03\x00\x09\x00\x0E\x00\x05\x00\x07\x00\x40\xE2\x01\x00", 16));
-
+  const DateTimeValue date{2004, 3, 9, 14, 5, 7, 123456};
+  CValue text, wide, number, when;
+  text.SetText("naïve");
+  wide.SetTextW(u"w\u00fc");
+  number.SetInteger(-42);
+  when.SetDateTime(date);
+  const int32_t row[] = {7, -8};
   MFile f;
-  f.OpenFile(path, MFile::kReadOnly);
+  f.OpenFile(Path("t"), MFile::kCreate);
+  f.WriteStr(CWStr(u"ab"));
+  f.WriteDate(date);
+  f.WriteShort(-2);
+  f.WriteDouble(2.5);
+  f.WriteStrW(u"\u4e2d");
+  f.WriteItemRow(row);
+  for (const CValue* v : {&text, &wide, &number, &when}) f.WriteValue(*v);
+  f.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("t")).substr(0, 22),
+            std::string("\x02\x00\x61\x00\x62\x00"
+                        "\xD4\x07\x03\x00\x09\x00\x0E\x00\x05\x00\x07\x00\x40\xE2\x01\x00",
+                        22));
+
+  f.Seek(0);
   CWStr ab;
   f.ReadStr(ab);
   EXPECT_EQ(std::u16string(ab.View()), u"ab");
-  EXPECT_EQ(f.ReadByte(), 0xFE);
-  EXPECT_EQ(f.ReadShort(), -2);
-  EXPECT_EQ(f.ReadInt(), -100000);
-  EXPECT_EQ(f.ReadDouble(), 2.5);
   EXPECT_EQ(f.ReadDate(), date);
-  std::string narrow;
-  f.ReadStr(narrow, 3);
-  EXPECT_EQ(narrow, "xyz");
-  std::u16string wide;
-  f.ReadStrW(wide, 2);
-  EXPECT_EQ(wide, u"\u00e9\u4e2d");
-  int32_t row[2] = {};
-  CValue text(VALUE_TYPE::AsciiString);
-  ASSERT_EQ(f.ReadRow(row, text), 0);
-  EXPECT_EQ(row[0], 7);
-  EXPECT_EQ(row[1], -8);
-  EXPECT_EQ(text.Narrow(), "naïve");
-  CValue wide_value(VALUE_TYPE::UnicodeString);
-  f.ReadValue(wide_value);
-  EXPECT_EQ(wide_value.Wide(), u"w\u00fc");
-  CValue number(VALUE_TYPE::Integer);
-  f.ReadValue(number);
-  EXPECT_EQ(number.GetInteger(), 42);
-  CValue when(VALUE_TYPE::DateTime);
-  f.ReadValue(when);
-  EXPECT_EQ(when.GetDateTime(), date);
-  EXPECT_EQ(f.ReadRow(row, text), 1);  // the end: nothing read
+  EXPECT_EQ(f.ReadShort(), -2);
+  EXPECT_EQ(f.ReadDouble(), 2.5);
+  std::u16string chinese;
+  f.ReadStrW(chinese, 1);
+  EXPECT_EQ(chinese, u"\u4e2d");
+  int32_t back[2] = {};
+  CValue text2(VALUE_TYPE::AsciiString), wide2(VALUE_TYPE::UnicodeString);
+  CValue number2(VALUE_TYPE::Integer), when2(VALUE_TYPE::DateTime);
+  ASSERT_EQ(f.ReadRow(back, text2), 0);
+  f.ReadValue(wide2);
+  f.ReadValue(number2);
+  f.ReadValue(when2);
+  EXPECT_EQ(back[1], -8);
+  EXPECT_EQ(text2.Narrow(), "naïve");
+  EXPECT_EQ(wide2.Wide(), u"w\u00fc");
+  EXPECT_EQ(number2.GetInteger(), -42);
+  EXPECT_EQ(when2.GetDateTime(), date);
+  EXPECT_EQ(f.ReadRow(back, text2), 1);  // the end: nothing read
 }
 
-TEST_F(MFileTest, TypedReadsAtTheEndNameThemselves) {
-  const std::string path = PathOf("empty.bin");
-  test::WriteFile(path, "");
+TEST_F(MFileTest, ReadsThatFindNothingNameThemselves) {
+  test::WriteFile(Path("n"), "");
   MFile f;
-  f.OpenFile(path, MFile::kReadOnly);
-  auto general = [](const char* method) {
-    return std::string("General Error (Module:MFile,Method:") + method + ")";
-  };
+  f.OpenFile(Path("n"), MFile::kReadOnly);
   CWStr w;
   CValue v(VALUE_TYPE::Double);
   std::string s;
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadInt(); }), general("ReadInt"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadByte(); }), general("ReadByte"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadDouble(); }), general("ReadDouble"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadDate(); }), general("ReadDate"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadStr(s, 2); }), general("ReadStr"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadStr(w); }), general("ReadStr(CWStr)"));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadValue(v); }), general("ReadValue"));
+  char byte = 0;
+  const std::vector<std::pair<const char*, std::function<void()>>> reads = {
+      {"ReadInt", [&] { f.ReadInt(); }},        {"ReadByte", [&] { f.ReadByte(); }},
+      {"ReadDouble", [&] { f.ReadDouble(); }},  {"ReadDate", [&] { f.ReadDate(); }},
+      {"ReadStr", [&] { f.ReadStr(s, 2); }},    {"ReadStr(CWStr)", [&] { f.ReadStr(w); }},
+      {"ReadValue", [&] { f.ReadValue(v); }},   {"ReadData", [&] { f.ReadData(&byte, 1); }},
+  };
+  for (const auto& [method, read] : reads) {
+    EXPECT_EQ(RaisedText<CMFileException>(read),
+              std::string("General Error (Module:MFile,Method:") + method + ")");
+  }
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.ReadShort(); }),
             "Error reading 2 bytes from file. Read: 0 (Module:MFile,Method:ReadShort)");
 }
 
 TEST_F(MFileTest, StringLengthsOutsideTheShortFieldAreRefused) {
-  const std::string path = PathOf("lengths.bin");
   MFile f;
-  f.OpenFile(path, MFile::kCreate);
-  CValue longest;
-  longest.SetText(std::string(MFile::kMaxStringLength, 'x'));
+  f.OpenFile(Path("l"), MFile::kCreate);
+  CValue longest, too_long, too_long_wide;
+  longest.SetText(std::string(32767, 'x'));
+  too_long.SetText(std::string(32768, 'x'));
+  too_long_wide.SetTextW(std::u16string(32768, u'x'));
   f.WriteValue(longest);
-  CValue too_long;
-  too_long.SetText(std::string(MFile::kMaxStringLength + 1, 'x'));
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteValue(too_long); }),
-            "Fatal error writting len to file (Module:MFile,Method:WriteValue)");
-  CValue too_long_wide;
-  too_long_wide.SetTextW(std::u16string(MFile::kMaxStringLength + 1, u'x'));
+  const std::string refused = "Fatal error writting len to file (Module:MFile,Method:";
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteValue(too_long); }), refused + "WriteValue)");
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteValue(too_long_wide); }),
-            "Fatal error writting len to file (Module:MFile,Method:WriteValue)");
-  EXPECT_EQ(RaisedText<CMFileException>(
-                [&] { f.WriteStr(CWStr(std::u16string(MFile::kMaxStringLength + 1, u'y'))); }),
-            "Fatal error writting len to file (Module:MFile,Method:WriteStr(CWStr))");
-  EXPECT_EQ(f.FileSize(true), 2 + static_cast<int64_t>(MFile::kMaxStringLength));
+            refused + "WriteValue)");
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteStr(CWStr(too_long_wide.Wide())); }),
+            refused + "WriteStr(CWStr))");
+  EXPECT_EQ(f.FileSize(), 2 + 32767);  // nothing of the refused values
 
-  // A negative length read back is refused, not used as a size.
   f.Seek(0);
   f.WriteShort(-1);
   f.Seek(0);
@@ -254,142 +198,81 @@ TEST_F(MFileTest, StringLengthsOutsideTheShortFieldAreRefused) {
 }
 
 TEST_F(MFileTest, FailedDiskWritesNameTheStepAndKeepTheCause) {
-  // /dev/full takes no byte: every platform write fails.
   MFile f;
-  f.OpenFile("/dev/full", MFile::kOpenOrCreate);
+  f.OpenFile("/dev/full", MFile::kOpenOrCreate);  // takes no byte
+  const std::string commit_failed = "Error writing to disk (Module:MFile,Method:MCommit)";
   f.WriteInt(1);
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.MCommit(); }),
-            "Error writing to disk (Module:MFile,Method:MCommit)");
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.MCommit(); }), commit_failed);
   const std::string big(6000, 'b');
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.mwrite(big.data(), big.size()); }),
             "OS error writing 6000 bytes to disk (Module:MFile,Method:mwrite)");
-
-  struct Case {
-    CValue value;
-    const char* text;
-    std::size_t filler = MFile::kBufferSize - 1;
-  };
-  std::vector<Case> cases(5);
-  cases[0].value.SetInteger(1);
-  cases[0].text = "Fatal error writting int to file";
-  cases[1].value.SetDouble(1.5);
-  cases[1].text = "Fatal error writting double to file";
-  cases[2].value.SetDateTime(DateTimeValue{2001, 1, 1, 0, 0, 0, 0});
-  cases[2].text = "Fatal error writting date to file";
-  cases[3].value.SetText(std::string(6000, 's'));
-  cases[3].text = "Fatal error writting string to file";
-  cases[3].filler = MFile::kBufferSize - 2;  // the length still fits
-  cases[4].value.SetText("ab");
-  cases[4].text = "Fatal error writting len to file";
-  for (const auto& c : cases) {
+  std::vector<std::pair<CValue, std::string>> cases(5);
+  cases[0].first.SetInteger(1);
+  cases[0].second = "int";
+  cases[1].first.SetDouble(1.5);
+  cases[1].second = "double";
+  cases[2].first.SetDateTime({2001, 1, 1, 0, 0, 0, 0});
+  cases[2].second = "date";
+  cases[3].first.SetText("ab");
+  cases[3].second = "len";
+  cases[4].first.SetText(big);
+  cases[4].second = "string";
+  for (const auto& [value, what] : cases) {
     // A nearly full buffer makes the failing write commit it.
-    const std::string filler(c.filler, 'f');
+    const std::string filler(what == "string" ? 4998 : 4999, 'f');
     f.mwrite(filler.data(), filler.size());
-    const auto chain = RaisedChain<CMFileException>([&] { f.WriteValue(c.value); });
-    ASSERT_EQ(chain.size(), 2u) << c.text;
-    EXPECT_EQ(chain[0], std::string(c.text) + " (Module:MFile,Method:WriteValue)");
-    EXPECT_EQ(chain[1], "Error writing to disk (Module:MFile,Method:MCommit)");
+    EXPECT_EQ(RaisedChain<CMFileException>([&] { f.WriteValue(value); }),
+              (std::vector<std::string>{
+                  "Fatal error writting " + what + " to file (Module:MFile,Method:WriteValue)",
+                  commit_failed}));
   }
 }
 
-TEST_F(MFileTest, ModesCreateKeepOrOnlyRead) {
-  const std::string path = PathOf("modes.bin");
-  test::WriteFile(path, "old");
+TEST_F(MFileTest, OpenModesAndTheirFailures) {
+  test::WriteFile(Path("m"), "old");
   MFile f;
-  f.OpenFile(path, MFile::kOpenOrCreate);
+  f.OpenFile(Path("m"), MFile::kOpenOrCreate);
   EXPECT_EQ(f.FileSize(), 3);
-  f.OpenFile(path, MFile::kCreate);
+  f.OpenFile(Path("m"), MFile::kCreate);
   EXPECT_EQ(f.FileSize(), 0);
-  f.Close();
-  f.OpenFile(PathOf("new.bin"), MFile::kOpenOrCreate);
-  EXPECT_TRUE(f.IsOpen());
-  f.Close();
-
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.OpenFile(path, 4); }),
-            "Error opening file " + path + " (Module:MFile,Method:OpenFile)");
-  const std::string missing = PathOf("missing.bin");
-  const auto chain = RaisedChain<CMFileException>([&] { f.OpenFile(missing, MFile::kReadOnly); });
-  ASSERT_EQ(chain.size(), 2u);
-  EXPECT_EQ(chain[0], "General Error (Module:MFile,Method:OpenFile)");
-  EXPECT_EQ(chain[1], "Access denied or disk full. Could not open or create file: " + missing +
-                          ". If you are running this component from a web server, the Internet "
-                          "user must have write access to the Quillmere Search data directory. "
-                          "(Module:STDFUN,Method:OpenWindowsFile)");
+  f.OpenFile(Path("gone"), MFile::kCreate, platform::kFileAttributeDeleteOnClose);
+  EXPECT_FALSE(platform::FileExists(Path("gone")));
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.OpenFile(Path("m"), 4); }),
+            "Error opening file " + Path("m") + " (Module:MFile,Method:OpenFile)");
+  EXPECT_EQ(RaisedChain<CMFileException>([&] { f.OpenFile(Path("missing"), MFile::kReadOnly); }),
+            (std::vector<std::string>{
+                "General Error (Module:MFile,Method:OpenFile)",
+                "Access denied or disk full. Could not open or create file: " + Path("missing") +
+                    ". If you are running this component from a web server, the Internet user "
+                    "must have write access to the Quillmere Search data directory. "
+                    "(Module:STDFUN,Method:OpenWindowsFile)"}));
   EXPECT_FALSE(f.IsOpen());
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteInt(1); }),
             "General Error (Module:MFile,Method:mwrite)");
 }
 
-TEST_F(MFileTest, DeleteOnCloseRemovesTheNameAtOnce) {
-  const std::string path = PathOf("scratch.tmp");
-  MFile f;
-  f.OpenFile(path, MFile::kCreate, platform::kFileAttributeDeleteOnClose);
-  EXPECT_FALSE(platform::FileExists(path));
-  f.WriteInt(77);
-  f.Seek(0);
-  EXPECT_EQ(f.ReadInt(), 77);
-}
-
-TEST_F(MFileTest, TakeOverKeepsPendingWritesAndTheReadPosition) {
-  const std::string path = PathOf("take.bin");
-  test::WriteFile(path, "0123456789");
-  MFile source;
-  source.OpenFile(path, MFile::kOpenOrCreate);
-  char c = 0;
-  source.mread(&c, 1);
-  source.mread(&c, 1);
-  MFile target;
-  target.TakeOver(source);
-  EXPECT_FALSE(source.IsOpen());
-  EXPECT_EQ(target.Path(), path);
-  EXPECT_EQ(target.GetMode(), MFile::kOpenOrCreate);
-  target.mread(&c, 1);
-  EXPECT_EQ(c, '2');
-
-  target.mwrite("AB", 2);  // pending when handed on
-  MFile third;
-  third.TakeOver(target);
-  third.mwrite("C", 1);
-  third.MCommit();
-  EXPECT_EQ(test::ReadFile(path), "012ABC6789");
-}
-
 TEST_F(MFileTest, ScrambledKeyValueLines) {
-  const std::string path = PathOf("options.dat");
-  std::string plain =
-      "first one\n"
-      "# a comment\n"
-      "\n"
-      " \t \n"
-      "  spaced\\ key   the value\t \r\n"
-      "lonely\n"
-      "long line\\\ncontinued\n"
-      "last without end";
-  std::string stored = plain;
+  std::string stored =
+      "first one\n# a comment\n\n \t \n  spaced\\ key   the value\t \r\n"
+      "lonely\nlong line\\\ncontinued\nlast without end";
   ScrambleConnectionText(stored);
-  test::WriteFile(path, stored);
-
+  test::WriteFile(Path("o"), stored);
   MFile f;
-  f.OpenFile(path, MFile::kReadOnly);
+  f.OpenFile(Path("o"), MFile::kReadOnly);
   std::vector<std::pair<std::string, std::string>> pairs;
-  CStr key;
-  CStr value;
+  CStr key, value;
   while (f.ReadKeyValueLine(key, value)) pairs.emplace_back(key.View(), value.View());
-  const std::vector<std::pair<std::string, std::string>> expected = {
-      {"first", "one"},
-      {"spaced key", "the value"},
-      {"lonely", ""},
-      {"long", "line\\\ncontinued"},
-      {"last", "without end"},
-  };
-  EXPECT_EQ(pairs, expected);
-
+  EXPECT_EQ(pairs, (std::vector<std::pair<std::string, std::string>>{
+                       {"first", "one"},
+                       {"spaced key", "the value"},
+                       {"lonely", ""},
+                       {"long", "line\\\ncontinued"},
+                       {"last", "without end"}}));
   f.Seek(0);
-  CStr line;
-  ASSERT_TRUE(f.ReadScrambledLine(line, '\n'));
-  EXPECT_EQ(line.View(), "first one");
+  ASSERT_TRUE(f.ReadScrambledLine(key, ' '));
+  EXPECT_EQ(key.View(), "first");
   f.SeekToEnd();
-  EXPECT_FALSE(f.ReadScrambledLine(line, '\n'));
+  EXPECT_FALSE(f.ReadScrambledLine(key, '\n'));
 }
 
 }  // namespace

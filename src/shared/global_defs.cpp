@@ -1,5 +1,7 @@
 #include "shared/global_defs.h"
 
+#include <algorithm>
+
 #include <utility>
 
 #include "platform/config_store.h"
@@ -95,6 +97,21 @@ CGlobalDefs::CGlobalDefs() {
 }
 
 CGlobalDefs::CGlobalDefs(const CGlobalDefs& other) { *this = other; }
+
+void CGlobalDefs::ResetProgress() {
+  std::lock_guard lock(progress_mutex_);
+  progress_ = 0;
+}
+
+void CGlobalDefs::SetProgress(int32_t percent) {
+  std::lock_guard lock(progress_mutex_);
+  progress_ = std::max(progress_, std::clamp(percent, 0, 100));
+}
+
+int32_t CGlobalDefs::GetProgress() const {
+  std::lock_guard lock(progress_mutex_);
+  return progress_;
+}
 
 CGlobalDefs& CGlobalDefs::operator=(const CGlobalDefs& other) {
   if (this == &other) return *this;

@@ -122,7 +122,16 @@ class CGlobalDefs {
   static constexpr int32_t kMajorVersion = 6;
   static constexpr int32_t kFileVersion = 601;
 
+  // --- progress of the job these settings belong to ---
+  // A job's progress never goes backwards: SetProgress keeps the highest value
+  // reached since the last ResetProgress.
+  void ResetProgress();
+  void SetProgress(int32_t percent);
+  int32_t GetProgress() const;
+
  private:
+  mutable std::mutex progress_mutex_;  // guards the progress only
+  int32_t progress_ = 0;
   mutable std::mutex mutex_;  // guards every field below
   std::string data_path_;
   std::string connection_string_;

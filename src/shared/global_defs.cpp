@@ -1,7 +1,6 @@
 #include "shared/global_defs.h"
 
 #include <algorithm>
-
 #include <utility>
 
 #include "platform/config_store.h"

@@ -265,6 +265,8 @@ void Connection::DownloadResource(const std::string& file_path) {
     if (t.result != CURLE_OK) throw fail(t.Reason());
     t.file = -1;
     if (file.Close() != 0) throw fail("cannot write " + file_path);
+    // The body is consumed: a second download must not pass for an empty resource.
+    t.Detach();
   });
 }
 

@@ -15,6 +15,7 @@ namespace qm {
 
 class CGlobalDefs;
 
+// One converter serves one build thread: it keeps loaded components.
 class DocConverter {
  public:
   // Reads Converters.txt once; a missing file means no document converts.

@@ -132,6 +132,12 @@ TEST_F(ConnectionTest, PagesEmptyAndLargeResources) {
   for (int i = 0; expected.size() < 100000; ++i) expected += "line " + std::to_string(i) + "\n";
   expected.resize(100000);
   EXPECT_EQ(Fetch(c, "/big.txt"), expected);
+
+  // A body is downloaded once; a second download does not pass for an empty resource.
+  c.OpenConnection(base_ + "/page.html");
+  c.DownloadResource(file);
+  EXPECT_NE(FailureText([&] { c.DownloadResource(file); }).find("Method:DownloadResource"),
+            std::string::npos);
 }
 
 TEST_F(ConnectionTest, SendsTheUserAgent) {

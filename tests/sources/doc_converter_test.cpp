@@ -11,6 +11,7 @@
 #include "sources/converter_runner.h"
 #include "sources/converter_table.h"
 #include "sources/doc_converter.h"
+#include "sources/document_text.h"
 #include "sources/converter_home.h"
 
 namespace qm {
@@ -221,6 +222,26 @@ TEST_F(DocConverterTest, UnreadableDocumentIsADocConverterError) {
     EXPECT_EQ(FailureText([&] { converter.ConvertForIndexing(docs_.Path() + name); }),
               "Unknown error reading file (Module:DocConverter,Method:ConvertText)\r\n");
   }
+}
+
+TEST_F(DocConverterTest, DocumentColumnValuesAndTracedFailures) {
+  home_.WriteConverters(".htm=[QUILLMERE_HTML_CONVERTER]\n.fail=F, " +
+                        Quoted(test::HelperPath("sample_converter")) + " fail\n");
+  DocConverter converter(home_.Defs());
+  Document("page.htm", "<p>from a file</p>");
+  EXPECT_EQ(FileDocumentText(converter, docs_.Path(), "page.htm"), "from a file");
+  EXPECT_EQ(EmbeddedDocumentText(converter, home_.Defs(), "<b>held in a column</b>", ".HTM"),
+            "held in a column");
+  // A failing conversion is traced and indexes nothing; the next value converts.
+  const std::string bad = Document("x.fail", "x");
+  EXPECT_EQ(ConvertedDocumentText(converter, bad), "");
+  EXPECT_EQ(FileDocumentText(converter, docs_.Path(), "page.htm"), "from a file");
+  const std::string trace = home_.TraceText();
+  EXPECT_NE(trace.find("RepDB.StartCollector - Could not convert document " + bad +
+                       " because of the following error: Error converting file."),
+            std::string::npos)
+      << trace;
+  EXPECT_EQ(home_.WorkFileCount(), 0);
 }
 
 #ifdef QM_EXAMPLE_CONVERTER

@@ -2,6 +2,7 @@
 // fetched by address.
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -29,6 +30,7 @@ class ServerProcess {
     if (pipe(out) != 0) return;
     pid_ = fork();
     if (pid_ == 0) {
+      prctl(PR_SET_PDEATHSIG, SIGKILL);  // never outlives a crashed test
       dup2(out[1], 1);
       close(out[0]);
       close(out[1]);

@@ -62,23 +62,6 @@ TEST(ConverterTable, KeysEntriesAndKinds) {
   EXPECT_EQ(ConverterTable::Parse("ALL=[PLAIN_TEXT]").Find(".anything"), "[PLAIN_TEXT]");
 }
 
-TEST(ConverterArguments, SplitBeforeSubstitutionInOnePass) {
-  const auto identity = [](std::string_view a) { return std::string(a); };
-  EXPECT_EQ(BuildConverterArguments("conv -in \"%1\" -out=%2 %3", identity, "/d/a b.txt", "/w/o"),
-            (std::vector<std::string>{"conv", "-in", "/d/a b.txt", "-out=/w/o", "%3"}));
-  // Paths that themselves hold "%1", "%2", quotes or blanks stay one argument, unchanged.
-  EXPECT_EQ(BuildConverterArguments("c %1 %2", identity, "/d/%2 \"x\" %1", "/w/%1"),
-            (std::vector<std::string>{"c", "/d/%2 \"x\" %1", "/w/%1"}));
-  // Expansion happens per argument, after the split.
-  const auto expand = [](std::string_view a) {
-    std::string s(a);
-    if (s.rfind("[DIR]\\", 0) == 0) s.replace(0, 6, "/my dir/");
-    return s;
-  };
-  EXPECT_EQ(BuildConverterArguments("[DIR]\\tool %1", expand, "doc", "out"),
-            (std::vector<std::string>{"/my dir/tool", "doc"}));
-}
-
 class DocConverterTest : public ::testing::Test {
  protected:
   void SetUp() override {

@@ -2,8 +2,6 @@
 
 #include <quillmere/converter_plugin.h>
 
-#include <filesystem>
-
 #include "platform/file_io.h"
 #include "platform/shared_library.h"
 #include "platform/text_encoding.h"

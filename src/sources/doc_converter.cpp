@@ -5,9 +5,11 @@
 
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
+#include "shared/converter_runner.h"
 #include "shared/exception_family.h"
+#include "shared/file_operations.h"
 #include "shared/global_defs.h"
-#include "sources/converter_runner.h"
+#include "shared/temp_names.h"
 #include "sources/document_encoding.h"
 
 namespace qm {
@@ -52,6 +54,24 @@ void StoreTextAndSummary(std::string text, FieldMap& fields) {
   });
 }
 
+// "%1" becomes the document, "%2" the output file, in one left-to-right pass,
+// so a path that itself holds "%1" or "%2" is put in as it is.
+std::string FillPaths(std::string_view argument, std::string_view document,
+                      std::string_view output) {
+  std::string out;
+  out.reserve(argument.size());
+  for (std::size_t i = 0; i < argument.size(); ++i) {
+    if (argument[i] == '%' && i + 1 < argument.size() &&
+        (argument[i + 1] == '1' || argument[i + 1] == '2')) {
+      out.append(argument[i + 1] == '1' ? document : output);
+      ++i;
+    } else {
+      out.push_back(argument[i]);
+    }
+  }
+  return out;
+}
+
 // Removes the converter's output file however the conversion ends.
 class OutputFile {
  public:
@@ -67,14 +87,8 @@ class OutputFile {
   const std::string& Path() const { return path_; }
   // Deletes the file now, reporting a failure.
   void Delete() {
-    Step("Unknown error deleting file", [&] {
-      std::error_code error;
-      std::filesystem::remove(path_, error);
-      if (error) {
-        throw CDocConverterException::Text("Unknown error deleting file", "ConvertText", nullptr);
-      }
-      path_.clear();
-    });
+    Step("Unknown error deleting file", [&] { DropFile(path_); });
+    path_.clear();
   }
 
  private:
@@ -133,13 +147,14 @@ void DocConverter::RunProgram(const std::string& command_line, const std::string
   // The output file is made only for a program that writes one, so other
   // conversions leave nothing behind in the work folder.
   OutputFile output(SLGetTempWorkFilePath(defs_, kTempCaller));
-  const std::vector<std::string> arguments =
-      Step("Unknown error generating execute path", [&] {
-        return BuildConverterArguments(
-            command_line, [this](std::string_view a) { return defs_.ExpandPlaceholders(a); },
-            document_path, output.Path());
-      });
-  Step("Unknown error executing converter", [&] { RunConverter(arguments); });
+  // The line is split before anything is put in; each argument then gets its
+  // folder placeholders and the two paths.
+  const ArgumentFiller fill = [&](std::string_view argument) {
+    return Step("Unknown error generating execute path", [&] {
+      return FillPaths(defs_.ExpandPlaceholders(argument), document_path, output.Path());
+    });
+  };
+  Step("Unknown error executing converter", [&] { qm::ConvertText(command_line, fill); });
   std::string text = ReadText(output.Path());
   output.Delete();
   StoreTextAndSummary(std::move(text), fields);

@@ -1,13 +1,12 @@
 #include "sources/document_text.h"
 
-#include <fcntl.h>
-
 #include <filesystem>
 #include <system_error>
 
-#include "platform/file_io.h"
 #include "shared/exception_family.h"
+#include "shared/file_operations.h"
 #include "shared/global_defs.h"
+#include "shared/temp_names.h"
 #include "shared/trace.h"
 #include "sources/connection.h"
 #include "sources/doc_converter.h"
@@ -79,12 +78,12 @@ std::string UrlDocumentText(DocConverter& converter, Connection& connection,
 std::string EmbeddedDocumentText(DocConverter& converter, const CGlobalDefs& defs,
                                  std::string_view content, std::string_view document_type) {
   const WorkFile file(SLGetTempWorkFilePath(defs, kTempCaller));
-  platform::FileHandle handle = platform::OpenFile(file.Path(), O_WRONLY | O_CREAT | O_TRUNC);
-  if (!handle.IsOpen() || !platform::WriteAll(handle.Get(), content.data(), content.size()) ||
-      handle.Close() != 0) {
+  try {
+    WriteTextFile(file.Path(), content);
+  } catch (CExceptionBase& e) {
     Trace(true, "REBLIB.RepDB.StartCollector",
           "Could not convert document %s because of the following error: %S", file.Path(),
-          "the document could not be written to the work folder");
+          Explain(e));
     return {};
   }
   return ConvertedDocumentText(converter, file.Path(), document_type);

@@ -7,8 +7,9 @@
 #include <filesystem>
 #include <fstream>
 
+#include "shared/converter_runner.h"
 #include "shared/exception_family.h"
-#include "sources/converter_runner.h"
+#include "shared/retry_pause.h"
 #include "sources/converter_table.h"
 #include "sources/doc_converter.h"
 #include "sources/document_text.h"
@@ -65,10 +66,11 @@ TEST(ConverterTable, KeysEntriesAndKinds) {
 class DocConverterTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    SetConverterTimingForTesting(std::chrono::milliseconds(50000), std::chrono::milliseconds(10));
+    SetRetryPauseHookForTesting([this](std::chrono::milliseconds) { ++retry_pauses_; });
   }
   void TearDown() override {
-    SetConverterTimingForTesting(std::chrono::milliseconds(50000), std::chrono::milliseconds(1000));
+    SetRetryPauseHookForTesting({});
+    SetConverterTimeoutForTesting(kConverterTimeout);
   }
 
   std::string Document(const std::string& name, const std::string& bytes) {
@@ -79,6 +81,7 @@ class DocConverterTest : public ::testing::Test {
 
   ConverterHome home_;
   test::ScratchDir docs_{"docs"};
+  int retry_pauses_ = 0;
 };
 
 TEST_F(DocConverterTest, ChoosesByExtensionOrTypeOrAll) {
@@ -179,7 +182,7 @@ TEST_F(DocConverterTest, FailingProgramsFailTheConversion) {
             std::string::npos)
       << fail;
 
-  SetConverterTimingForTesting(std::chrono::milliseconds(300), std::chrono::milliseconds(10));
+  SetConverterTimeoutForTesting(std::chrono::milliseconds(300));
   const std::string hang_text = FailureText([&] { converter.ConvertForIndexing(Document("b.hang", "x")); });
   EXPECT_NE(hang_text.find("- Error Code: -1 (Module:STDFUN,Method:ConvertText)"), std::string::npos)
       << hang_text;
@@ -191,9 +194,10 @@ TEST_F(DocConverterTest, FailingProgramsFailTheConversion) {
   const std::string gone = FailureText([&] { converter.ConvertForIndexing(Document("c.gone", "x")); });
   EXPECT_NE(gone.find("CMD: /no/such/program " + docs_.Path() + "c.gone "), std::string::npos) << gone;
   EXPECT_NE(gone.find(" - Error Code: 2 (Module:STDFUN,Method:ConvertText)"), std::string::npos) << gone;
+  EXPECT_EQ(retry_pauses_, 4) << "a program that cannot start is tried 5 times";
 
   EXPECT_EQ(FailureText([&] { converter.ConvertForIndexing(Document("d.none", "x")); }),
-            "Error converting file. Could not execute converter. CMD:  - Error Code: 2 "
+            "Error converting file. Could not execute converter. CMD:  - Error Code: 22 "
             "(Module:STDFUN,Method:ConvertText)\r\n");
   EXPECT_EQ(home_.WorkFileCount(), 0);
 }

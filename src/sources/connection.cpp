@@ -3,6 +3,7 @@
 #include <curl/curl.h>
 #include <fcntl.h>
 
+#include <algorithm>
 #include <atomic>
 #include <ctime>
 #include <mutex>

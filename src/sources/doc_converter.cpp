@@ -4,7 +4,6 @@
 #include <system_error>
 
 #include "platform/file_io.h"
-#include "platform/text_encoding.h"
 #include "shared/converter_runner.h"
 #include "shared/exception_family.h"
 #include "shared/file_operations.h"

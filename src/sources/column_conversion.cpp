@@ -122,8 +122,8 @@ bool DoubleToInteger32(double value, int32_t& out) {
 
 std::string DoubleToText(double value) {
   char buffer[64];
-  const auto [end, ec] = std::to_chars(buffer, buffer + sizeof buffer, value,
-                                       std::chars_format::general);
+  const auto [end, ec] =
+      std::to_chars(buffer, buffer + sizeof buffer, value, std::chars_format::general);
   return ec == std::errc() ? std::string(buffer, end) : std::string();
 }
 

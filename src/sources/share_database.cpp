@@ -87,7 +87,9 @@ bool IsEmptyKeyword(const std::string& s) { return AsciiUpper(s) == "EMPTY"; }
 }  // namespace
 
 CShareDatabase::CShareDatabase(CGlobalDefs& defs)
-    : defs_(defs), last_diagnostic_(kNoExplanation), last_diagnostic_w_(Utf8ToUtf16(kNoExplanation)) {
+    : defs_(defs),
+      last_diagnostic_(kNoExplanation),
+      last_diagnostic_w_(Utf8ToUtf16(kNoExplanation)) {
   read_buffer_.resize(kTextPieceBytes);
 }
 
@@ -170,7 +172,8 @@ void CShareDatabase::Disconnect() {
   }
   if (connection_) {
     SQLDisconnect(Dbc(connection_));
-    if (!connection_.Free() && failure == nullptr) failure = "Error freeing resource: SQLFreeConnect";
+    if (!connection_.Free() && failure == nullptr)
+      failure = "Error freeing resource: SQLFreeConnect";
   }
   if (environment_) {
     if (!environment_.Free() && failure == nullptr) failure = "Error freeing resource: SQLFreeEnv";
@@ -293,8 +296,8 @@ void CShareDatabase::DescribeColumns(int16_t count) {
         c.description.size = kLongColumnSize;
         break;
       default:
-        c.description.size = static_cast<uint32_t>(
-            std::min<SQLULEN>(size, std::numeric_limits<uint32_t>::max()));
+        c.description.size =
+            static_cast<uint32_t>(std::min<SQLULEN>(size, std::numeric_limits<uint32_t>::max()));
     }
     c.value_type = ValueTypeOf(type);
     switch (type) {
@@ -436,8 +439,7 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
     if (rc == SQL_NO_DATA) {
       // Only a column read before has no data left at the first call.
       if (first) {
-        throw CShareDatabaseException::Text("Column value already read", "GetColumnValue",
-                                            nullptr);
+        throw CShareDatabaseException::Text("Column value already read", "GetColumnValue", nullptr);
       }
       break;
     }
@@ -482,8 +484,7 @@ bool CShareDatabase::ReadBinaryToFile(int index, CValue& value) {
                    static_cast<SQLLEN>(piece.size()), &indicator);
     if (rc == SQL_NO_DATA) {
       if (first) {
-        throw CShareDatabaseException::Text("Column value already read", "GetColumnValue",
-                                            nullptr);
+        throw CShareDatabaseException::Text("Column value already read", "GetColumnValue", nullptr);
       }
       break;
     }
@@ -555,8 +556,8 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
         RaiseRead("GetColumnValue");
       }
       if (indicator == SQL_NULL_DATA) return null_value();
-      value.SetDateTime(DateTimeValue{ts.year, ts.month, ts.day, ts.hour, ts.minute, ts.second,
-                                      ts.fraction});
+      value.SetDateTime(
+          DateTimeValue{ts.year, ts.month, ts.day, ts.hour, ts.minute, ts.second, ts.fraction});
       return kValueRead;
     }
     case ReadKind::Time: {
@@ -572,14 +573,16 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
       return kValueRead;
     }
     case ReadKind::NarrowText: {
-      if (reserve) value.ReserveNarrow(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
+      if (reserve)
+        value.ReserveNarrow(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
       if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
       AssignColumnText(bytes, kMaxColumnCharacters, value.NarrowBuffer());
       value.SetType(VALUE_TYPE::AsciiString);
       return kValueRead;
     }
     case ReadKind::WideText: {
-      if (reserve) value.ReserveWide(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
+      if (reserve)
+        value.ReserveWide(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
       if (!ReadTextBytes(index, SQL_C_WCHAR, bytes)) return null_value();
       // SQLWCHAR units in the machine's own order, as the driver wrote them.
       std::u16string units(bytes.size() / sizeof(char16_t), u'\0');
@@ -597,7 +600,8 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
 
 int CShareDatabase::GetColumnValue(int index, CValue& value, bool reserve, int32_t requested_type) {
   CheckIndex(index, "GetColumnValue");
-  if (!row_available_) throw CShareDatabaseException::Text("No current row", "GetColumnValue", nullptr);
+  if (!row_available_)
+    throw CShareDatabaseException::Text("No current row", "GetColumnValue", nullptr);
   const int result = ReadColumn(index, value, reserve);
   if (result == kValueRead && requested_type != 0 &&
       requested_type != static_cast<int32_t>(value.GetType())) {
@@ -640,16 +644,16 @@ int CShareDatabase::GetColumnValueFromCache(std::string_view name, VALUE_TYPE re
                                             CValue& value) {
   const int index = GetColumnIndex(name);
   if (index == 0) {
-    throw CShareDatabaseException::Text("Column name %S does not exist",
-                                        "GetColumnValueFromCache", nullptr, name);
+    throw CShareDatabaseException::Text("Column name %S does not exist", "GetColumnValueFromCache",
+                                        nullptr, name);
   }
   return GetColumnValueFromCache(index, requested, value);
 }
 
 int CShareDatabase::GetColumnValueFromCache(int index, VALUE_TYPE requested, CValue& value) {
   if (index < 1 || static_cast<std::size_t>(index) > cache_.Count()) {
-    throw CShareDatabaseException::Text("Column does not exist in cache",
-                                        "GetColumnValueFromCache", nullptr);
+    throw CShareDatabaseException::Text("Column does not exist in cache", "GetColumnValueFromCache",
+                                        nullptr);
   }
   // A cache that does not hold the current row would hand out another row's values.
   if (!row_available_ || !cache_valid_) {

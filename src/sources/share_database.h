@@ -139,7 +139,7 @@ class CShareDatabase {
   CColumnValues cache_;
   std::vector<bool> cache_null_;
   std::vector<bool> cache_binary_;
-  bool cache_valid_ = false;  // the cache holds the current row
+  bool cache_valid_ = false;              // the cache holds the current row
   std::vector<std::string> cache_files_;  // temporary files made by CacheColumns
   OdbcHandle environment_;
   OdbcHandle connection_;
@@ -153,8 +153,8 @@ class CShareDatabase {
   std::vector<Column> columns_;  // columns_[0] is column 1
   int16_t column_count_ = 0;
   std::string statement_text_;
-  std::string chunk_;       // bytes of the text being read
-  std::string read_buffer_; // one SQLGetData piece
+  std::string chunk_;        // bytes of the text being read
+  std::string read_buffer_;  // one SQLGetData piece
 };
 
 }  // namespace qm

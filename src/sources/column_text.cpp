@@ -1,5 +1,8 @@
 #include "sources/column_text.h"
 
+#include <cstdint>
+#include <cstring>
+
 #include "platform/text_encoding.h"
 
 namespace qm {
@@ -20,9 +23,18 @@ bool WasInvalid(std::string_view bytes, std::size_t start, std::size_t end, char
 }  // namespace
 
 void AssignColumnText(std::string_view bytes, std::size_t max_chars, std::string& out) {
-  // Fast path: measure the valid prefix and copy it in one go.
+  // Fast path: measure the valid prefix and copy it in one go; plain ASCII is
+  // skipped eight bytes at a time.
   std::size_t pos = 0;
   std::size_t chars = 0;
+  constexpr uint64_t kHighBits = 0x8080808080808080ull;
+  while (pos + 8 <= bytes.size() && chars + 8 <= max_chars) {
+    uint64_t word;
+    std::memcpy(&word, bytes.data() + pos, 8);
+    if ((word & kHighBits) != 0) break;
+    pos += 8;
+    chars += 8;
+  }
   while (pos < bytes.size() && chars < max_chars) {
     if (static_cast<unsigned char>(bytes[pos]) < 0x80) {
       ++pos;

@@ -5,6 +5,7 @@
 #include <sqlext.h>
 
 #include <algorithm>
+#include <bit>
 #include <cstring>
 #include <filesystem>
 #include <limits>
@@ -24,8 +25,11 @@ namespace {
 constexpr const char* kNoExplanation = "No explanation from database";
 constexpr std::size_t kColumnNameBytes = 200;
 constexpr uint32_t kLongColumnSize = 2000;
-// One SQLGetData piece of text; most values arrive in one.
-constexpr std::size_t kTextPieceBytes = 4096;
+// SQLGetData pieces of text: the first for a column starts small and grows to
+// fit its values; later pieces of a long value take the whole buffer.
+constexpr std::size_t kTextPieceBytes = 8192;
+constexpr std::size_t kFirstTextPieceBytes = 256;
+constexpr std::size_t kFirstNumberPieceBytes = 64;
 // Enough bytes for kMaxColumnCharacters of any UTF-8 or UTF-16 text: reading
 // stops there, the rest would be cut anyway.
 constexpr std::size_t kEnoughTextBytes = kMaxColumnCharacters * 4 + 8;
@@ -300,11 +304,13 @@ void CShareDatabase::DescribeColumns(int16_t count) {
             static_cast<uint32_t>(std::min<SQLULEN>(size, std::numeric_limits<uint32_t>::max()));
     }
     c.value_type = ValueTypeOf(type);
+    c.piece_bytes = kFirstTextPieceBytes;
     switch (type) {
       case SQL_INTEGER:
       case SQL_SMALLINT:
       case SQL_TINYINT:
         c.read_kind = ReadKind::Integer;
+        c.piece_bytes = kFirstNumberPieceBytes;
         break;
       case SQL_NUMERIC:
       case SQL_DECIMAL:
@@ -312,6 +318,7 @@ void CShareDatabase::DescribeColumns(int16_t count) {
       case SQL_REAL:
       case SQL_DOUBLE:
         c.read_kind = ReadKind::Double;
+        c.piece_bytes = kFirstNumberPieceBytes;
         break;
       case SQL_DATE:
       case SQL_TIMESTAMP:
@@ -428,14 +435,16 @@ VALUE_TYPE CShareDatabase::GetFieldType(int index) const {
 // ---------------------------------------------------------------- reading
 
 bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& bytes) {
+  Column& column = columns_[static_cast<std::size_t>(index - 1)];
   const std::size_t terminator = c_type == SQL_C_WCHAR ? 2 : 1;
-  const std::size_t room = read_buffer_.size() - terminator;
   chunk_.clear();
+  // The first piece is sized to the column's values so far: drivers may fill
+  // the whole buffer they are given (strncpy), so a large one costs on every row.
+  std::size_t length = column.piece_bytes;
   for (bool first = true;; first = false) {
     SQLLEN indicator = 0;
-    const SQLRETURN rc =
-        SQLGetData(Stmt(statement_), static_cast<SQLUSMALLINT>(index), c_type, read_buffer_.data(),
-                   static_cast<SQLLEN>(read_buffer_.size()), &indicator);
+    const SQLRETURN rc = SQLGetData(Stmt(statement_), static_cast<SQLUSMALLINT>(index), c_type,
+                                    read_buffer_.data(), static_cast<SQLLEN>(length), &indicator);
     if (rc == SQL_NO_DATA) {
       // Only a column read before has no data left at the first call.
       if (first) {
@@ -447,6 +456,7 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
     if (indicator == SQL_NULL_DATA) return false;
     // SQLSTATE 01004: the piece filled the buffer and more follows.
     const bool more = rc == SQL_SUCCESS_WITH_INFO && ReadSqlState(statement_) == "01004";
+    const std::size_t room = length - terminator;
     const std::size_t got = (more || indicator == SQL_NO_TOTAL || indicator < 0)
                                 ? room
                                 : std::min(static_cast<std::size_t>(indicator), room);
@@ -456,7 +466,9 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
     }
     chunk_.append(read_buffer_.data(), got);
     if (!more || chunk_.size() >= kEnoughTextBytes) break;
+    length = read_buffer_.size();
   }
+  column.piece_bytes = std::min(std::bit_ceil(chunk_.size() + terminator), read_buffer_.size());
   bytes = chunk_;
   return true;
 }

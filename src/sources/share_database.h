@@ -116,6 +116,7 @@ class CShareDatabase {
     ColumnDescription description;
     VALUE_TYPE value_type = VALUE_TYPE::AsciiString;
     ReadKind read_kind = ReadKind::NarrowText;
+    std::size_t piece_bytes = 0;  // buffer length of the first SQLGetData call
   };
 
   void CheckIndex(int index, const char* method) const;

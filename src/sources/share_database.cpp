@@ -9,6 +9,7 @@
 #include <cstring>
 #include <filesystem>
 #include <limits>
+#include <new>
 
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -88,6 +89,26 @@ std::string RestAfterIndexName(std::string_view statement) {
 
 bool IsEmptyKeyword(const std::string& s) { return AsciiUpper(s) == "EMPTY"; }
 
+// The module boundary of every public operation: the module's own errors, and
+// the end-of-rows warning, pass on; another module's error becomes this
+// module's general error with the cause chained; anything else the unknown one.
+template <class Body>
+decltype(auto) Guarded(const char* method, Body&& body) {
+  try {
+    return body();
+  } catch (const CShareDatabaseException&) {
+    throw;
+  } catch (const CShareDatabaseWarning&) {
+    throw;
+  } catch (const CException& e) {
+    throw CShareDatabaseException::General(method, &e);
+  } catch (const CShareDatabaseUnknownException&) {
+    throw;
+  } catch (...) {
+    throw CShareDatabaseUnknownException::Unknown(method);
+  }
+}
+
 }  // namespace
 
 CShareDatabase::CShareDatabase(CGlobalDefs& defs)
@@ -112,77 +133,82 @@ CShareDatabase::~CShareDatabase() {
 // ---------------------------------------------------------------- connection
 
 void CShareDatabase::Connect() {
-  if (IsConnected() || environment_) Disconnect();
-  if (!defs_.IsConnectionSet()) defs_.LoadGroupConnection();
+  Guarded("Connect", [&] {
+    if (IsConnected() || environment_) Disconnect();
+    if (!defs_.IsConnectionSet()) defs_.LoadGroupConnection();
 
-  OdbcHandle environment;
-  OdbcHandle connection;
-  if (!environment.Allocate(OdbcHandle::kEnvironment, nullptr)) {
-    throw CShareDatabaseException::Text("Error allocating resource", "Connect", nullptr);
-  }
-  if (!SQL_SUCCEEDED(SQLSetEnvAttr(environment.Get(), SQL_ATTR_ODBC_VERSION,
-                                   reinterpret_cast<SQLPOINTER>(SQL_OV_ODBC3), 0))) {
-    RaiseFrom(environment, "Connect");
-  }
-  if (!connection.Allocate(OdbcHandle::kConnection, &environment)) {
-    throw CShareDatabaseException::Text("Error allocating resource", "Connect", nullptr);
-  }
+    OdbcHandle environment;
+    OdbcHandle connection;
+    if (!environment.Allocate(OdbcHandle::kEnvironment, nullptr)) {
+      throw CShareDatabaseException::Text("Error allocating resource", "Connect", nullptr);
+    }
+    if (!SQL_SUCCEEDED(SQLSetEnvAttr(environment.Get(), SQL_ATTR_ODBC_VERSION,
+                                     reinterpret_cast<SQLPOINTER>(SQL_OV_ODBC3), 0))) {
+      RaiseFrom(environment, "Connect");
+    }
+    if (!connection.Allocate(OdbcHandle::kConnection, &environment)) {
+      throw CShareDatabaseException::Text("Error allocating resource", "Connect", nullptr);
+    }
 
-  if (defs_.GetConnectionMode() == ConnectionMode::ConnectionString) {
-    std::string text = defs_.GetConnectionString();
-    // Only a text that names a folder needs (and may fail for want of) a data path.
-    if (text.find("[QUILLMERE_") != std::string::npos) text = defs_.ExpandPlaceholders(text);
-    SQLCHAR out[1024];
-    SQLSMALLINT out_length = 0;
-    const SQLRETURN rc = SQLDriverConnect(Dbc(connection), nullptr, SqlText(text), SQL_NTS, out,
-                                          sizeof out, &out_length, SQL_DRIVER_NOPROMPT);
-    if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLDriverConnect");
-  } else {
-    const std::string dsn = defs_.GetDsn();
-    std::string user = defs_.GetUserId();
-    std::string password = defs_.GetPassword();
-    if (IsEmptyKeyword(user)) user.clear();
-    if (IsEmptyKeyword(password)) password.clear();
-    const SQLRETURN rc = SQLConnect(Dbc(connection), SqlText(dsn), SQL_NTS, SqlText(user), SQL_NTS,
-                                    SqlText(password), SQL_NTS);
-    if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLConnect");
-  }
+    if (defs_.GetConnectionMode() == ConnectionMode::ConnectionString) {
+      std::string text = defs_.GetConnectionString();
+      // Only a text that names a folder needs (and may fail for want of) a data path.
+      if (text.find("[QUILLMERE_") != std::string::npos) text = defs_.ExpandPlaceholders(text);
+      SQLCHAR out[1024];
+      SQLSMALLINT out_length = 0;
+      const SQLRETURN rc = SQLDriverConnect(Dbc(connection), nullptr, SqlText(text), SQL_NTS, out,
+                                            sizeof out, &out_length, SQL_DRIVER_NOPROMPT);
+      if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLDriverConnect");
+    } else {
+      const std::string dsn = defs_.GetDsn();
+      std::string user = defs_.GetUserId();
+      std::string password = defs_.GetPassword();
+      if (IsEmptyKeyword(user)) user.clear();
+      if (IsEmptyKeyword(password)) password.clear();
+      const SQLRETURN rc = SQLConnect(Dbc(connection), SqlText(dsn), SQL_NTS, SqlText(user),
+                                      SQL_NTS, SqlText(password), SQL_NTS);
+      if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLConnect");
+    }
 
-  OdbcHandle statement;
-  if (!statement.Allocate(OdbcHandle::kStatement, &connection)) {
-    TakeDiagnostic(connection);
-    SQLDisconnect(Dbc(connection));
-    throw CShareDatabaseException::Text("%S", "SQLAllocStmtv", nullptr, last_diagnostic_);
-  }
-  environment_ = std::move(environment);
-  connection_ = std::move(connection);
-  statement_ = std::move(statement);
-  row_available_ = false;
-  end_of_data_ = true;
-  first_fetch_empty_ = false;
-  cache_valid_ = false;
+    OdbcHandle statement;
+    if (!statement.Allocate(OdbcHandle::kStatement, &connection)) {
+      TakeDiagnostic(connection);
+      SQLDisconnect(Dbc(connection));
+      throw CShareDatabaseException::Text("%S", "SQLAllocStmtv", nullptr, last_diagnostic_);
+    }
+    environment_ = std::move(environment);
+    connection_ = std::move(connection);
+    statement_ = std::move(statement);
+    row_available_ = false;
+    end_of_data_ = true;
+    first_fetch_empty_ = false;
+    cache_valid_ = false;
+  });
 }
 
 void CShareDatabase::Disconnect() {
-  row_available_ = false;
-  end_of_data_ = true;
-  first_fetch_empty_ = false;
-  cache_valid_ = false;
-  // Release everything first, then report the first refusal.
-  const char* failure = nullptr;
-  if (statement_) {
-    SQLFreeStmt(Stmt(statement_), SQL_CLOSE);
-    if (!statement_.Free()) failure = "Error freeing resource: SQLFreeStmt";
-  }
-  if (connection_) {
-    SQLDisconnect(Dbc(connection_));
-    if (!connection_.Free() && failure == nullptr)
-      failure = "Error freeing resource: SQLFreeConnect";
-  }
-  if (environment_) {
-    if (!environment_.Free() && failure == nullptr) failure = "Error freeing resource: SQLFreeEnv";
-  }
-  if (failure != nullptr) throw CShareDatabaseException::Text(failure, "Disconnect", nullptr);
+  Guarded("Disconnect", [&] {
+    row_available_ = false;
+    end_of_data_ = true;
+    first_fetch_empty_ = false;
+    cache_valid_ = false;
+    // Release everything first, then report the first refusal.
+    const char* failure = nullptr;
+    if (statement_) {
+      SQLFreeStmt(Stmt(statement_), SQL_CLOSE);
+      if (!statement_.Free()) failure = "Error freeing resource: SQLFreeStmt";
+    }
+    if (connection_) {
+      SQLDisconnect(Dbc(connection_));
+      if (!connection_.Free() && failure == nullptr)
+        failure = "Error freeing resource: SQLFreeConnect";
+    }
+    if (environment_) {
+      if (!environment_.Free() && failure == nullptr)
+        failure = "Error freeing resource: SQLFreeEnv";
+    }
+    if (failure != nullptr) throw CShareDatabaseException::Text(failure, "Disconnect", nullptr);
+  });
 }
 
 // ---------------------------------------------------------------- diagnostics
@@ -224,49 +250,51 @@ void CShareDatabase::CloseCursor() {
 }
 
 void CShareDatabase::ExecuteSql(std::string_view statement, int16_t& column_count) {
-  if (!statement_) {
-    throw CShareDatabaseException::Text("Not connected to a database", "ExecuteSql", nullptr);
-  }
-  CloseCursor();
-  row_available_ = false;
-  end_of_data_ = true;
-  first_fetch_empty_ = false;
-  cache_valid_ = false;
-  column_count_ = 0;
-  column_count = 0;
-  columns_.clear();
-  statement_text_.assign(statement);
-
-  if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(statement_text_), SQL_NTS))) {
-    RaiseFrom(statement_, "ExecuteSql", statement_text_);
-  }
-  const SQLRETURN executed = SQLExecute(Stmt(statement_));
-  // SQL_NO_DATA: a searched UPDATE or DELETE that touched no row.
-  if (!SQL_SUCCEEDED(executed) && executed != SQL_NO_DATA) {
-    RaiseFrom(statement_, "ExecuteSql", statement_text_);
-  }
-  SQLSMALLINT count = 0;
-  if (!SQL_SUCCEEDED(SQLNumResultCols(Stmt(statement_), &count))) {
-    RaiseFrom(statement_, "ExecuteSql", statement_text_);
-  }
-  if (count > kMaxColumns) {
+  Guarded("ExecuteSql", [&] {
+    if (!statement_) {
+      throw CShareDatabaseException::Text("Not connected to a database", "ExecuteSql", nullptr);
+    }
     CloseCursor();
-    throw CShareDatabaseException::Text("Too many table columns", "ExecuteSql", nullptr);
-  }
-  DescribeColumns(count);
-  column_count_ = count;
-  column_count = count;
-  if (count == 0) return;
+    row_available_ = false;
+    end_of_data_ = true;
+    first_fetch_empty_ = false;
+    cache_valid_ = false;
+    column_count_ = 0;
+    column_count = 0;
+    columns_.clear();
+    statement_text_.assign(statement);
 
-  const SQLRETURN fetched = SQLFetch(Stmt(statement_));
-  if (fetched == SQL_NO_DATA) {
-    // An empty result shows itself on the first column read (the warning).
-    first_fetch_empty_ = true;
-  } else if (!SQL_SUCCEEDED(fetched)) {
-    RaiseFrom(statement_, "ExecuteSql", statement_text_);
-  }
-  row_available_ = true;
-  end_of_data_ = false;
+    if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(statement_text_), SQL_NTS))) {
+      RaiseFrom(statement_, "ExecuteSql", statement_text_);
+    }
+    const SQLRETURN executed = SQLExecute(Stmt(statement_));
+    // SQL_NO_DATA: a searched UPDATE or DELETE that touched no row.
+    if (!SQL_SUCCEEDED(executed) && executed != SQL_NO_DATA) {
+      RaiseFrom(statement_, "ExecuteSql", statement_text_);
+    }
+    SQLSMALLINT count = 0;
+    if (!SQL_SUCCEEDED(SQLNumResultCols(Stmt(statement_), &count))) {
+      RaiseFrom(statement_, "ExecuteSql", statement_text_);
+    }
+    if (count > kMaxColumns) {
+      CloseCursor();
+      throw CShareDatabaseException::Text("Too many table columns", "ExecuteSql", nullptr);
+    }
+    DescribeColumns(count);
+    column_count_ = count;
+    column_count = count;
+    if (count == 0) return;
+
+    const SQLRETURN fetched = SQLFetch(Stmt(statement_));
+    if (fetched == SQL_NO_DATA) {
+      // An empty result shows itself on the first column read (the warning).
+      first_fetch_empty_ = true;
+    } else if (!SQL_SUCCEEDED(fetched)) {
+      RaiseFrom(statement_, "ExecuteSql", statement_text_);
+    }
+    row_available_ = true;
+    end_of_data_ = false;
+  });
 }
 
 void CShareDatabase::DescribeColumns(int16_t count) {
@@ -348,23 +376,25 @@ void CShareDatabase::DescribeColumns(int16_t count) {
 }
 
 int CShareDatabase::MoveNext() {
-  cache_valid_ = false;
-  if (end_of_data_ || first_fetch_empty_ || !statement_) {
-    end_of_data_ = true;
+  return Guarded("MoveNext", [&] {
+    cache_valid_ = false;
+    if (end_of_data_ || first_fetch_empty_ || !statement_) {
+      end_of_data_ = true;
+      row_available_ = false;
+      return kNoMoreRows;
+    }
+    const SQLRETURN rc = SQLFetch(Stmt(statement_));
+    if (SQL_SUCCEEDED(rc)) {
+      row_available_ = true;
+      return kRowFetched;
+    }
     row_available_ = false;
-    return kNoMoreRows;
-  }
-  const SQLRETURN rc = SQLFetch(Stmt(statement_));
-  if (SQL_SUCCEEDED(rc)) {
-    row_available_ = true;
-    return kRowFetched;
-  }
-  row_available_ = false;
-  if (rc == SQL_NO_DATA) {
-    end_of_data_ = true;
-    return kNoMoreRows;
-  }
-  RaiseFrom(statement_, "MoveNext", statement_text_);
+    if (rc == SQL_NO_DATA) {
+      end_of_data_ = true;
+      return kNoMoreRows;
+    }
+    RaiseFrom(statement_, "MoveNext", statement_text_);
+  });
 }
 
 // ---------------------------------------------------------------- columns
@@ -584,25 +614,34 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
       value.SetDateTime(DateTimeValue{0, 0, 0, t.hour, t.minute, t.second, 0});
       return kValueRead;
     }
-    case ReadKind::NarrowText: {
-      if (reserve)
-        value.ReserveNarrow(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
-      if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
-      AssignColumnText(bytes, kMaxColumnCharacters, value.NarrowBuffer());
-      value.SetType(VALUE_TYPE::AsciiString);
-      return kValueRead;
-    }
-    case ReadKind::WideText: {
-      if (reserve)
-        value.ReserveWide(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
-      if (!ReadTextBytes(index, SQL_C_WCHAR, bytes)) return null_value();
-      // SQLWCHAR units in the machine's own order, as the driver wrote them.
-      std::u16string units(bytes.size() / sizeof(char16_t), u'\0');
-      std::memcpy(units.data(), bytes.data(), units.size() * sizeof(char16_t));
-      AssignColumnText(units, kMaxColumnCharacters, value.WideBuffer());
-      value.SetType(VALUE_TYPE::UnicodeString);
-      return kValueRead;
-    }
+    case ReadKind::NarrowText:
+      try {
+        if (reserve) {
+          value.ReserveNarrow(
+              std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
+        }
+        if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
+        AssignColumnText(bytes, kMaxColumnCharacters, value.NarrowBuffer());
+        value.SetType(VALUE_TYPE::AsciiString);
+        return kValueRead;
+      } catch (const std::bad_alloc&) {
+        throw CShareDatabaseException::Text("Error allocating memory", "GetColumnValue", nullptr);
+      }
+    case ReadKind::WideText:
+      try {
+        if (reserve) {
+          value.ReserveWide(std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
+        }
+        if (!ReadTextBytes(index, SQL_C_WCHAR, bytes)) return null_value();
+        // SQLWCHAR units in the machine's own order, as the driver wrote them.
+        wide_units_.resize(bytes.size() / sizeof(char16_t));
+        std::memcpy(wide_units_.data(), bytes.data(), wide_units_.size() * sizeof(char16_t));
+        AssignColumnText(wide_units_, kMaxColumnCharacters, value.WideBuffer());
+        value.SetType(VALUE_TYPE::UnicodeString);
+        return kValueRead;
+      } catch (const std::bad_alloc&) {
+        throw CShareDatabaseException::Text("Eror allocating memory", "GetColumnValue", nullptr);
+      }
     case ReadKind::Binary:
       if (!ReadBinaryToFile(index, value)) return null_value();
       return kValueRead;
@@ -611,45 +650,51 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
 }
 
 int CShareDatabase::GetColumnValue(int index, CValue& value, bool reserve, int32_t requested_type) {
-  CheckIndex(index, "GetColumnValue");
-  if (!row_available_)
-    throw CShareDatabaseException::Text("No current row", "GetColumnValue", nullptr);
-  const int result = ReadColumn(index, value, reserve);
-  if (result == kValueRead && requested_type != 0 &&
-      requested_type != static_cast<int32_t>(value.GetType())) {
-    ConvertColumnValue(value, static_cast<VALUE_TYPE>(requested_type), value, "GetColumnValue");
-  }
-  return result;
+  return Guarded("GetColumnValue", [&] {
+    CheckIndex(index, "GetColumnValue");
+    if (!row_available_)
+      throw CShareDatabaseException::Text("No current row", "GetColumnValue", nullptr);
+    const int result = ReadColumn(index, value, reserve);
+    if (result == kValueRead && requested_type != 0 &&
+        requested_type != static_cast<int32_t>(value.GetType())) {
+      ConvertColumnValue(value, static_cast<VALUE_TYPE>(requested_type), value, "GetColumnValue");
+    }
+    return result;
+  });
 }
 
 // ---------------------------------------------------------------- cache
 
 void CShareDatabase::AllocateCache() {
-  cache_.Release();
-  cache_valid_ = false;
-  cache_null_.assign(static_cast<std::size_t>(column_count_), false);
-  cache_binary_.assign(static_cast<std::size_t>(column_count_), false);
-  for (int i = 1; i <= column_count_; ++i) {
-    const Column& c = columns_[static_cast<std::size_t>(i - 1)];
-    cache_.AddColumn(GetFieldType(i), static_cast<std::size_t>(c.description.size) + 1);
-    cache_binary_[static_cast<std::size_t>(i - 1)] = c.read_kind == ReadKind::Binary;
-  }
+  Guarded("AllocateCache", [&] {
+    cache_.Release();
+    cache_valid_ = false;
+    cache_null_.assign(static_cast<std::size_t>(column_count_), false);
+    cache_binary_.assign(static_cast<std::size_t>(column_count_), false);
+    for (int i = 1; i <= column_count_; ++i) {
+      const Column& c = columns_[static_cast<std::size_t>(i - 1)];
+      cache_.AddColumn(GetFieldType(i), static_cast<std::size_t>(c.description.size) + 1);
+      cache_binary_[static_cast<std::size_t>(i - 1)] = c.read_kind == ReadKind::Binary;
+    }
+  });
 }
 
 void CShareDatabase::CacheColumns() {
-  if (cache_.Count() < static_cast<std::size_t>(column_count_)) {
-    throw CShareDatabaseException::Text("Column cache not allocated for all columns",
-                                        "CacheColumns", nullptr);
-  }
-  cache_valid_ = false;
-  for (int i = 1; i <= column_count_; ++i) {
-    const auto slot = static_cast<std::size_t>(i - 1);
-    CValue& value = cache_[slot];
-    const int result = GetColumnValue(i, value, false, 0);
-    cache_null_[slot] = result == kValueNull;
-    if (result == kValueRead && cache_binary_[slot]) cache_files_.emplace_back(value.Narrow());
-  }
-  cache_valid_ = true;
+  Guarded("CacheColumns", [&] {
+    if (cache_.Count() < static_cast<std::size_t>(column_count_)) {
+      throw CShareDatabaseException::Text("Column cache not allocated for all columns",
+                                          "CacheColumns", nullptr);
+    }
+    cache_valid_ = false;
+    for (int i = 1; i <= column_count_; ++i) {
+      const auto slot = static_cast<std::size_t>(i - 1);
+      CValue& value = cache_[slot];
+      const int result = GetColumnValue(i, value, false, 0);
+      cache_null_[slot] = result == kValueNull;
+      if (result == kValueRead && cache_binary_[slot]) cache_files_.emplace_back(value.Narrow());
+    }
+    cache_valid_ = true;
+  });
 }
 
 int CShareDatabase::GetColumnValueFromCache(std::string_view name, VALUE_TYPE requested,
@@ -663,84 +708,90 @@ int CShareDatabase::GetColumnValueFromCache(std::string_view name, VALUE_TYPE re
 }
 
 int CShareDatabase::GetColumnValueFromCache(int index, VALUE_TYPE requested, CValue& value) {
-  if (index < 1 || static_cast<std::size_t>(index) > cache_.Count()) {
-    throw CShareDatabaseException::Text("Column does not exist in cache", "GetColumnValueFromCache",
-                                        nullptr);
-  }
-  // A cache that does not hold the current row would hand out another row's values.
-  if (!row_available_ || !cache_valid_) {
-    throw CShareDatabaseException::Text("No current row", "GetColumnValueFromCache", nullptr);
-  }
-  const auto slot = static_cast<std::size_t>(index - 1);
-  if (cache_null_[slot]) return kValueNull;
-  ConvertColumnValue(cache_[slot], requested, value, "GetColumnValueFromCache");
-  return kValueRead;
+  return Guarded("GetColumnValueFromCache", [&] {
+    if (index < 1 || static_cast<std::size_t>(index) > cache_.Count()) {
+      throw CShareDatabaseException::Text("Column does not exist in cache",
+                                          "GetColumnValueFromCache", nullptr);
+    }
+    // A cache that does not hold the current row would hand out another row's values.
+    if (!row_available_ || !cache_valid_) {
+      throw CShareDatabaseException::Text("No current row", "GetColumnValueFromCache", nullptr);
+    }
+    const auto slot = static_cast<std::size_t>(index - 1);
+    if (cache_null_[slot]) return kValueNull;
+    ConvertColumnValue(cache_[slot], requested, value, "GetColumnValueFromCache");
+    return kValueRead;
+  });
 }
 
 void CShareDatabase::CleanCacheColumns() {
-  if (cache_.Count() < static_cast<std::size_t>(column_count_)) {
-    throw CShareDatabaseException::Text("Column cache not allocated for all columns",
-                                        "CleanCacheColumns", nullptr);
-  }
-  std::string failed;
-  for (const auto& path : cache_files_) {
-    std::error_code ec;
-    std::filesystem::remove(path, ec);
-    if (ec && failed.empty()) failed = path;
-  }
-  cache_files_.clear();
-  if (!failed.empty()) {
-    throw CShareDatabaseException::Text("Error deleting file: %S", "CleanCacheColumns", nullptr,
-                                        failed);
-  }
+  Guarded("CleanCacheColumns", [&] {
+    if (cache_.Count() < static_cast<std::size_t>(column_count_)) {
+      throw CShareDatabaseException::Text("Column cache not allocated for all columns",
+                                          "CleanCacheColumns", nullptr);
+    }
+    std::string failed;
+    for (const auto& path : cache_files_) {
+      std::error_code ec;
+      std::filesystem::remove(path, ec);
+      if (ec && failed.empty()) failed = path;
+    }
+    cache_files_.clear();
+    if (!failed.empty()) {
+      throw CShareDatabaseException::Text("Error deleting file: %S", "CleanCacheColumns", nullptr,
+                                          failed);
+    }
+  });
 }
 
 // ---------------------------------------------------------------- indexes
 
 void CShareDatabase::CreateIndex(std::string_view statement) {
-  try {
-    Connect();
-  } catch (const CException& e) {
-    throw CShareDatabaseException::Text("Error connecting to database", "CreateIndex", &e);
-  }
-  // Leaves no connection behind when the index cannot be made.
-  struct QuietDisconnect {
-    CShareDatabase* db;
-    ~QuietDisconnect() {
-      try {
-        db->Disconnect();
-      } catch (...) {
+  Guarded("CreateIndex", [&] {
+    try {
+      Connect();
+    } catch (const CException& e) {
+      throw CShareDatabaseException::Text("Error connecting to database", "CreateIndex", &e);
+    }
+    // Leaves no connection behind when the index cannot be made.
+    struct QuietDisconnect {
+      CShareDatabase* db;
+      ~QuietDisconnect() {
+        try {
+          db->Disconnect();
+        } catch (...) {
+        }
+      }
+    } guard{this};
+
+    auto refused = [this] {
+      const CShareDatabaseException cause =
+          CShareDatabaseException::Text("%S", "CreateIndex", nullptr, last_diagnostic_);
+      return CShareDatabaseException::Numbered(36, "CreateIndex", &cause);
+    };
+
+    const std::string rest = RestAfterIndexName(statement);
+    // The plain name only tests that the data source takes the statement.
+    const std::string probe = "create index " + std::string(kTypindex) + " " + rest;
+    if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(probe), SQL_NTS))) {
+      TakeDiagnostic(statement_);
+      throw refused();
+    }
+    bool created = false;
+    for (int i = 1; i <= kMaxTypindexTries && !created; ++i) {
+      CloseCursor();
+      const std::string sql =
+          "create index " + std::string(kTypindex) + std::to_string(i) + " " + rest;
+      if (SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(sql), SQL_NTS)) &&
+          SQL_SUCCEEDED(SQLExecute(Stmt(statement_)))) {
+        created = true;
+      } else {
+        TakeDiagnostic(statement_);
       }
     }
-  } guard{this};
-
-  auto refused = [this] {
-    const CShareDatabaseException cause =
-        CShareDatabaseException::Text("%S", "CreateIndex", nullptr, last_diagnostic_);
-    return CShareDatabaseException::Numbered(36, "CreateIndex", &cause);
-  };
-
-  const std::string rest = RestAfterIndexName(statement);
-  // The plain name only tests that the data source takes the statement.
-  const std::string probe = "create index " + std::string(kTypindex) + " " + rest;
-  if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(probe), SQL_NTS))) {
-    TakeDiagnostic(statement_);
-    throw refused();
-  }
-  bool created = false;
-  for (int i = 1; i <= kMaxTypindexTries && !created; ++i) {
-    CloseCursor();
-    const std::string sql =
-        "create index " + std::string(kTypindex) + std::to_string(i) + " " + rest;
-    if (SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(sql), SQL_NTS)) &&
-        SQL_SUCCEEDED(SQLExecute(Stmt(statement_)))) {
-      created = true;
-    } else {
-      TakeDiagnostic(statement_);
-    }
-  }
-  if (!created) throw refused();
-  Disconnect();
+    if (!created) throw refused();
+    Disconnect();
+  });
 }
 
 }  // namespace qm

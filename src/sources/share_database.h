@@ -154,8 +154,9 @@ class CShareDatabase {
   std::vector<Column> columns_;  // columns_[0] is column 1
   int16_t column_count_ = 0;
   std::string statement_text_;
-  std::string chunk_;        // bytes of the text being read
-  std::string read_buffer_;  // one SQLGetData piece
+  std::string chunk_;          // bytes of the text being read
+  std::string read_buffer_;    // one SQLGetData piece
+  std::u16string wide_units_;  // a wide value's units, before the cut
 };
 
 }  // namespace qm

@@ -341,6 +341,27 @@ TEST_F(DatabaseTest, CacheMisuseIsReportedByName) {
             "No current row (Module:ShareDatabase,Method:GetColumnValueFromCache)\r\n");
 }
 
+TEST_F(DatabaseTest, BinaryColumnWithoutWorkFolderFailsWithTheCause) {
+  UseSqlite();
+  CGlobalDefs no_data_path;  // nowhere to put the binary copy
+  no_data_path.SetConnectionString(defs_.GetConnectionString(), "test");
+  CShareDatabase db(no_data_path);
+  db.Connect();
+  Run(db, "CREATE TABLE b (data BLOB)");
+  Run(db, "INSERT INTO b VALUES (X'01')");
+  int16_t n = 0;
+  db.ExecuteSql("SELECT data FROM b", n);
+  db.AllocateCache();
+  try {
+    db.CacheColumns();
+    FAIL() << "the copy cannot be made";
+  } catch (CShareDatabaseException& e) {
+    EXPECT_EQ(e.GetEntries().front().text,
+              u"General Error (Module:ShareDatabase,Method:GetColumnValue)");
+    EXPECT_NE(FullText(e).find("Data path is not set"), std::string::npos) << FullText(e);
+  }
+}
+
 TEST_F(DatabaseTest, ConnectionStringPlaceholdersAndConnectFailures) {
   // The store folder's placeholder is expanded before the driver sees the text.
   defs_.SetConnectionString("Driver=SQLite3;Database=[QUILLMERE_DATA_STORE]\\Default.db;StepAPI=1",

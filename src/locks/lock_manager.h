@@ -50,10 +50,15 @@ class CLockManager {
   bool HoldsWriter() const { return writer_ != 0; }
   int32_t ReaderCount() const { return reader_count_; }
 
-  // Test hook: multiplies every time-out by factor (1.0 restores the defaults).
+  // Test hook: multiplies every time-out (50,000 ms writer, 10,000 ms per
+  // reader unit) by factor; 1.0 restores them.
   static void ScaleTimeoutsForTesting(double factor);
 
  private:
+  // Open the lock's named object for this object's writer or readers.
+  void CreateWriterMutex();
+  void CreateReaderSemaphore();
+
   std::string lock_name_;
   std::unique_ptr<platform::NamedLock> readers_;
   int32_t reader_count_ = 0;

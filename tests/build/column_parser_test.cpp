@@ -1,0 +1,63 @@
+#include "build/findex_column_parser.h"
+#include "build/order_column_parser.h"
+#include "translator_fixture.h"
+
+namespace qm::test {
+namespace {
+
+using ColumnParserTest = TranslatorTest;  // for the shipped error texts
+
+TEST_F(ColumnParserTest, FindexColumnsWithTags) {
+  ColumnMap columns;
+  ParseFindexColumns(
+      u" title : CONTENT_WEIGHT = 3 :CONTENT_TYPE=URL:BASE_URL=\"http://host:8080/docs/\","
+      u"\"body, text\":DOCUMENT_TYPE=\"a\"\"b\",page:BASE_URL=\"http://h/?a=b\",zeta",
+      columns, "CreateFindex");
+  const ColumnMap expected{
+      {"body, text", {{"DOCUMENT_TYPE", "a\"b"}}},
+      {"page", {{"BASE_URL", "http://h/?a=b"}}},
+      {"title", {{"BASE_URL", "http://host:8080/docs/"}, {"CONTENT_TYPE", "URL"}, {"CONTENT_WEIGHT", "3"}}},
+      {"zeta", {}}};
+  EXPECT_EQ(columns, expected);
+}
+
+TEST_F(ColumnParserTest, RepeatedFindexColumnReplacesTheEarlierOne) {
+  ColumnMap columns{{"stale", {}}};
+  ParseFindexColumns(u"b,a:X=1,a:Y=2", columns, "TranslateW");
+  EXPECT_EQ(columns, (ColumnMap{{"a", {{"Y", "2"}}}, {"b", {}}}));
+  CIndexHeader header;
+  header.Columns = columns;
+  EXPECT_EQ(header.ColumnNames(), "a,b");
+}
+
+TEST_F(ColumnParserTest, RejectedFindexListsLeaveTheMapAsItWas) {
+  for (const char16_t* list : {u"", u"  ", u",a", u"a,,b", u"a,", u":X=1", u"a:X", u"a:",
+                               u"a::X=1", u"a:=3", u"\"a", u"a:X=\"1", u"\"\":X=1"}) {
+    SCOPED_TRACE(Utf16ToUtf8(list));
+    ColumnMap columns{{"kept", {}}};
+    try {
+      ParseFindexColumns(list, columns, "CreateFindex");
+      ADD_FAILURE() << "accepted";
+    } catch (const CPiCmdException& e) {
+      EXPECT_EQ(e.GetErrorNumber(), 17);
+      EXPECT_NE(Utf16ToUtf8(e.GetEntries().front().text).find("Method:CreateFindex)"),
+                std::string::npos);
+    }
+    EXPECT_EQ(columns, (ColumnMap{{"kept", {}}}));
+  }
+}
+
+TEST_F(ColumnParserTest, OrderColumnsInListOrder) {
+  OrderColumnList columns{{"stale", {}}};
+  ParseOrderColumns(u"year, title ,\"last, first\",a:b", columns, "TranslateW");
+  COrderInfo info;
+  info.Columns = columns;
+  EXPECT_EQ(info.ColumnNames(), "year,title,\"last, first\",a:b");
+
+  EXPECT_THROW(ParseOrderColumns(u"a,,b", columns, "TranslateW"), CPiCmdException);
+  EXPECT_THROW(ParseOrderColumns(u"\"a,b", columns, "TranslateW"), CPiCmdException);
+  EXPECT_EQ(columns.size(), 4u);
+}
+
+}  // namespace
+}  // namespace qm::test

@@ -1,0 +1,166 @@
+// Preparing and splitting a value as the builder does: case, markup, words,
+// positions and the language hook.
+#include <gtest/gtest.h>
+
+#include <random>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "platform/text_encoding.h"
+#include "text/blank_trim.h"
+#include "text/word_splitter.h"
+
+namespace qm {
+namespace {
+
+// "position:CUT=FORM" for every word considered, blank-separated.
+template <class Text>
+std::string Words(CWordSplitter& splitter, const Text& text, std::int32_t position = 0) {
+  std::string out;
+  splitter.Split(text, position, [&](const SplitWord& w) {
+    out += (out.empty() ? "" : " ") + std::to_string(w.position) + ":" + Utf16ToUtf8(w.cut) + "=" +
+           Utf16ToUtf8(w.form);
+  });
+  return out;
+}
+
+CWordSplitter DefaultSplitter(bool remove_html = false, CWordFilter* filter = nullptr) {
+  return CWordSplitter(CSeparatorSet(DefaultSeparators()), remove_html, filter);
+}
+
+TEST(WordSplitter, TagsAreRemovedWithoutLeavingABlank) {
+  CWordSplitter html = DefaultSplitter(true);
+  EXPECT_EQ(Words(html, std::string("one<b>two")), "1:ONETWO=ONETWO");
+  EXPECT_EQ(Words(html, std::string("one <b> two")), "1:ONE=ONE 2:TWO=TWO");
+  // Upper-casing comes first, so scripts go in any case; an unclosed tag takes the rest.
+  EXPECT_EQ(Words(html, std::string("a<script>var x;</Script>b c <img src=lost")), "1:AB=AB 2:C=C");
+  CWordSplitter plain = DefaultSplitter(false);
+  EXPECT_EQ(Words(plain, std::string("one<b>two")), "1:ONE=ONE 2:B=B 3:TWO=TWO");
+}
+
+TEST(WordSplitter, SentenceEndsLeaveAPositionGap) {
+  CWordSplitter splitter = DefaultSplitter();
+  EXPECT_EQ(Words(splitter, std::string("one two. three")), "1:ONE=ONE 2:TWO=TWO 4:THREE=THREE");
+  EXPECT_EQ(Words(splitter, std::string("end.next")), "1:END=END 2:NEXT=NEXT");
+  EXPECT_EQ(Words(splitter, std::string("j. smith")), "1:J=J 2:SMITH=SMITH");
+  EXPECT_EQ(Words(splitter, std::string("wait... then")), "1:WAIT=WAIT 3:THEN=THEN");
+  // The ".." left after "wait..." at the end is never a word but still ends the text.
+  std::int32_t after_wait = 0;
+  EXPECT_EQ(Words(splitter, std::string("wait..."), after_wait), "1:WAIT=WAIT");
+  splitter.Split(std::string("wait..."), after_wait, [](const SplitWord&) {});
+  EXPECT_EQ(after_wait, 3);
+  // Values of separators only give nothing.
+  EXPECT_EQ(Words(splitter, std::string("")), "");
+  EXPECT_EQ(Words(splitter, std::string(" .;- ")), "");
+  // The position is the caller's and runs on from where it stands.
+  std::int32_t position = 10;
+  splitter.Split(std::u16string(u"alpha beta."), position, [](const SplitWord&) {});
+  EXPECT_EQ(position, 14);  // BETA at 12, the sentence end, then the blank remainder
+}
+
+// Stop words and normalisation as a language object does them.
+class TestFilter : public CWordFilter {
+ public:
+  std::vector<std::u16string> asked;
+  bool IsStopWord(std::u16string_view word) override {
+    asked.emplace_back(word);
+    return word == u"THE" || word == u"IT";
+  }
+  void Normalise(std::u16string_view word, std::u16string& out) override {
+    out.assign(word == u"XX" ? u"" : word);
+    if (out.size() > 3 && out.back() == u'S') out.pop_back();
+  }
+};
+
+TEST(WordSplitter, DroppedWordsKeepTheirSentenceGap) {
+  TestFilter filter;
+  CWordSplitter splitter = DefaultSplitter(false, &filter);
+  EXPECT_EQ(Words(splitter, std::string("the rivers xx run. it. flows")),
+            "0:THE= 1:RIVERS=RIVER 1:XX= 2:RUN=RUN 3:IT= 5:FLOWS=FLOW");
+  EXPECT_EQ(filter.asked[1], u"RIVERS");  // the stop test sees the word as cut
+}
+
+TEST(WordSplitter, UpperCasingIsSimplePerCharacter) {
+  CWordSplitter splitter = DefaultSplitter();
+  // ß and ﬁ have no one-character upper case and stay; Deseret (outside the BMP) has one.
+  EXPECT_EQ(Words(splitter, std::string("straße élan \xEF\xAC\x81n \xF0\x90\x90\xA8x")),
+            "1:STRAßE=STRAßE 2:ÉLAN=ÉLAN 3:\xEF\xAC\x81N=\xEF\xAC\x81N 4:\xF0\x90\x90\x80X=\xF0\x90\x90\x80X");
+  EXPECT_EQ(Words(splitter, std::u16string(u"stra\u00DFe \U00010428x")),
+            "1:STRAßE=STRAßE 2:\xF0\x90\x90\x80X=\xF0\x90\x90\x80X");
+}
+
+TEST(WordSplitter, NonAsciiSeparatorsCutOnlyWhereTheyStand) {
+  // « is C2 AB and – is E2 80 93; ª (C2 AA) and — (E2 80 94) share bytes with them.
+  CWordSplitter splitter(CSeparatorSet(BuildSeparators(u"\u00AB\u2013", true)), false);
+  EXPECT_EQ(Words(splitter, std::string("x\xC2\xAAy\xC2\xABz a\xE2\x80\x94" "b\xE2\x80\x93" "c")),
+            "1:X\xC2\xAAY=X\xC2\xAAY 2:Z=Z 3:A\xE2\x80\x94" "B=A\xE2\x80\x94" "B 4:C=C");
+  // Invalid bytes become U+FFFD, part of the word.
+  EXPECT_EQ(Words(splitter, std::string("a\xFF" "b")), "1:A\xEF\xBF\xBD" "B=A\xEF\xBF\xBD" "B");
+}
+
+// Random input never crashes or stalls, positions never go back, and the words
+// are the upper-cased runs of non-separators (cut to 198 units, trimmed).
+TEST(WordSplitter, RandomInputGivesTheRunsBetweenSeparators) {
+  std::mt19937 rng(20240611);
+  const std::u16string alphabet = u"ab \t.;:?!-<>\u00DF\u00E9\u00AB\u2013\U0001F600" +
+                                  std::u16string{char16_t(0xD800), char16_t(0xDC00)};  // lone halves too
+  for (int round = 0; round < 400; ++round) {
+    std::u16string option;
+    for (int k = 0, n = rng() % 6; k < n; ++k) option += alphabet[rng() % alphabet.size()];
+    const CSeparatorSet set(BuildSeparators(option, rng() % 2 == 0));
+    std::u16string value;
+    for (int k = 0, n = rng() % 3 == 0 ? 500 : 40; k < n; ++k) {
+      value += rng() % 7 == 0 ? char16_t(u'A' + rng() % 3) : alphabet[rng() % alphabet.size()];
+    }
+    if (round % 10 == 0) value += std::u16string(300, u'z') + u" " + std::u16string(300, u'y');
+
+    CWordSplitter splitter(set, rng() % 2 == 0);
+    std::int32_t position = 0;
+    std::int32_t previous = 0;
+    std::vector<std::u16string> got;
+    splitter.Split(value, position, [&](const SplitWord& w) {
+      ASSERT_FALSE(w.cut.empty());
+      ASSERT_LE(w.cut.size(), kMaxWordLength);
+      ASSERT_GE(w.position, previous);
+      previous = w.position;
+      got.emplace_back(w.cut);
+    });
+    ASSERT_GE(position, previous);
+
+    // An independent cut, for sets that hold the appended blank and no markup removal.
+    if (!set.Contains(u' ')) continue;
+    CWordSplitter no_html(set, false);
+    got.clear();
+    no_html.Split(value, position, [&](const SplitWord& w) { got.emplace_back(w.cut); });
+    std::vector<std::u16string> expected;
+    std::u16string run;
+    const std::u16string upper = ToUpper(std::u16string_view(value)) + u" ";
+    std::size_t len = 0;
+    for (std::size_t i = 0; i < upper.size(); i += len) {
+      if (!set.IsSeparatorAt(upper, i, len)) {
+        run.append(upper, i, len);
+        continue;
+      }
+      const std::u16string_view word = TrimBlanks(std::u16string_view(run).substr(0, Utf16CutLength(run, 198)));
+      if (!word.empty()) expected.emplace_back(word);
+      run.clear();
+    }
+    ASSERT_EQ(got, expected) << "round " << round;
+  }
+}
+
+TEST(WordSplitter, RandomBytesAsUtf8NeverStall) {
+  std::mt19937 rng(7);
+  CWordSplitter splitter = DefaultSplitter(true);
+  for (int round = 0; round < 300; ++round) {
+    std::string bytes(rng() % 600, '\0');
+    for (auto& b : bytes) b = static_cast<char>(rng());
+    std::int32_t position = 0;
+    splitter.Split(bytes, position, [](const SplitWord& w) { ASSERT_FALSE(w.cut.empty()); });
+    ASSERT_LE(position, static_cast<std::int32_t>(bytes.size()) + 2);
+  }
+}
+
+}  // namespace
+}  // namespace qm

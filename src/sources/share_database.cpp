@@ -670,11 +670,9 @@ void CShareDatabase::AllocateCache() {
     cache_.Release();
     cache_valid_ = false;
     cache_null_.assign(static_cast<std::size_t>(column_count_), false);
-    cache_binary_.assign(static_cast<std::size_t>(column_count_), false);
     for (int i = 1; i <= column_count_; ++i) {
       const Column& c = columns_[static_cast<std::size_t>(i - 1)];
       cache_.AddColumn(GetFieldType(i), static_cast<std::size_t>(c.description.size) + 1);
-      cache_binary_[static_cast<std::size_t>(i - 1)] = c.read_kind == ReadKind::Binary;
     }
   });
 }
@@ -691,7 +689,11 @@ void CShareDatabase::CacheColumns() {
       CValue& value = cache_[slot];
       const int result = GetColumnValue(i, value, false, 0);
       cache_null_[slot] = result == kValueNull;
-      if (result == kValueRead && cache_binary_[slot]) cache_files_.emplace_back(value.Narrow());
+      // Only a copy this read made is the cache's to remove: the current
+      // statement's column decides, not the one the cache was allocated for.
+      if (result == kValueRead && columns_[slot].read_kind == ReadKind::Binary) {
+        cache_files_.emplace_back(value.Narrow());
+      }
     }
     cache_valid_ = true;
   });

@@ -139,7 +139,6 @@ class CShareDatabase {
   CGlobalDefs& defs_;
   CColumnValues cache_;
   std::vector<bool> cache_null_;
-  std::vector<bool> cache_binary_;
   bool cache_valid_ = false;              // the cache holds the current row
   std::vector<std::string> cache_files_;  // temporary files made by CacheColumns
   OdbcHandle environment_;

@@ -341,6 +341,33 @@ TEST_F(DatabaseTest, CacheMisuseIsReportedByName) {
             "No current row (Module:ShareDatabase,Method:GetColumnValueFromCache)\r\n");
 }
 
+TEST_F(DatabaseTest, CacheRemovesOnlyTheCopiesItMade) {
+  UseSqlite();
+  const std::string bystander = scratch_.Path() + "keep.txt";
+  test::WriteFile(bystander, "data");
+  {
+    CShareDatabase db(defs_);
+    db.Connect();
+    Run(db, "CREATE TABLE f (data BLOB, name TEXT)");
+    Run(db, "INSERT INTO f VALUES (X'01', '" + bystander + "')");
+    int16_t n = 0;
+    db.ExecuteSql("SELECT data FROM f", n);
+    db.AllocateCache();
+    db.CacheColumns();
+    db.CleanCacheColumns();
+    // The same cache, a statement whose first column is text naming a file.
+    db.ExecuteSql("SELECT name FROM f", n);
+    db.CacheColumns();
+    db.CleanCacheColumns();
+    EXPECT_TRUE(fs::exists(bystander));
+    // A copy nobody cleaned goes with the object.
+    db.ExecuteSql("SELECT data FROM f", n);
+    db.CacheColumns();
+    EXPECT_EQ(WorkFiles(), 1u);
+  }
+  EXPECT_EQ(WorkFiles(), 0u);
+}
+
 TEST_F(DatabaseTest, BinaryColumnWithoutWorkFolderFailsWithTheCause) {
   UseSqlite();
   CGlobalDefs no_data_path;  // nowhere to put the binary copy

@@ -14,6 +14,10 @@ namespace {
 constexpr std::size_t kMaxMixedTextUnits = 10000;
 
 std::string_view TrimBlanks(std::string_view text) {
+  if (text.empty() ||
+      (text.front() != ' ' && text.front() != '\t' && text.back() != ' ' && text.back() != '\t')) {
+    return text;
+  }
   const auto first = text.find_first_not_of(" \t");
   if (first == std::string_view::npos) return {};
   const auto last = text.find_last_not_of(" \t");
@@ -68,17 +72,35 @@ bool IsText(VALUE_TYPE t) { return t == VALUE_TYPE::AsciiString || t == VALUE_TY
 
 bool ParseInteger64(std::string_view text, int64_t& out) {
   text = TrimBlanks(text);
-  const bool signed_text = !text.empty() && (text.front() == '+' || text.front() == '-');
-  const std::string_view digits = signed_text ? text.substr(1) : text;
-  if (digits.empty()) return false;
-  for (char c : digits) {
-    if (c < '0' || c > '9') return false;
+  bool negative = false;
+  if (!text.empty() && (text.front() == '+' || text.front() == '-')) {
+    negative = text.front() == '-';
+    text.remove_prefix(1);
   }
-  // from_chars takes a leading '-' but not a '+'.
-  const std::string_view number = (signed_text && text.front() == '-') ? text : digits;
+  if (text.empty()) return false;
+  if (text.size() <= 18) {
+    // Eighteen digits cannot overflow: no checks per digit.
+    int64_t v = 0;
+    for (char c : text) {
+      if (c < '0' || c > '9') return false;
+      v = v * 10 + (c - '0');
+    }
+    out = negative ? -v : v;
+    return true;
+  }
+  // Accumulated as a negative number, whose range holds INT64_MIN.
+  constexpr int64_t kMin = std::numeric_limits<int64_t>::min();
   int64_t v = 0;
-  const auto [end, ec] = std::from_chars(number.data(), number.data() + number.size(), v);
-  if (ec != std::errc() || end != number.data() + number.size()) return false;
+  for (char c : text) {
+    if (c < '0' || c > '9') return false;
+    const int digit = c - '0';
+    if (v < (kMin + digit) / 10) return false;
+    v = v * 10 - digit;
+  }
+  if (!negative) {
+    if (v == kMin) return false;
+    v = -v;
+  }
   out = v;
   return true;
 }
@@ -142,6 +164,10 @@ std::string DateTimeToText(const DateTimeValue& d) {
 
 void ConvertColumnValue(const CValue& from, VALUE_TYPE to, CValue& out, const char* method) {
   const VALUE_TYPE type = from.GetType();
+  if (type == to && type == VALUE_TYPE::AsciiString) {
+    out.SetText(from.Narrow());  // the common case, first
+    return;
+  }
   std::string scratch;
   switch (to) {
     case VALUE_TYPE::Integer: {

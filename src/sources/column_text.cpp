@@ -20,21 +20,31 @@ bool WasInvalid(std::string_view bytes, std::size_t start, std::size_t end, char
   return cp == kReplacement && bytes.substr(start, end - start) != "\xEF\xBF\xBD";
 }
 
+// True when every byte is below 0x80; branch-free over whole words.
+bool IsAscii(std::string_view bytes) {
+  constexpr uint64_t kHighBits = 0x8080808080808080ull;
+  uint64_t any = 0;
+  std::size_t pos = 0;
+  for (; pos + 8 <= bytes.size(); pos += 8) {
+    uint64_t word;
+    std::memcpy(&word, bytes.data() + pos, 8);
+    any |= word;
+  }
+  for (; pos < bytes.size(); ++pos) any |= static_cast<unsigned char>(bytes[pos]);
+  return (any & kHighBits) == 0;
+}
+
 }  // namespace
 
 void AssignColumnText(std::string_view bytes, std::size_t max_chars, std::string& out) {
-  // Fast path: measure the valid prefix and copy it in one go; plain ASCII is
-  // skipped eight bytes at a time.
+  // Most values: plain ASCII no longer than the limit, copied as they are.
+  if (bytes.size() <= max_chars && IsAscii(bytes)) {
+    out.assign(bytes.data(), bytes.size());
+    return;
+  }
+  // Measure the valid prefix and copy it in one go.
   std::size_t pos = 0;
   std::size_t chars = 0;
-  constexpr uint64_t kHighBits = 0x8080808080808080ull;
-  while (pos + 8 <= bytes.size() && chars + 8 <= max_chars) {
-    uint64_t word;
-    std::memcpy(&word, bytes.data() + pos, 8);
-    if ((word & kHighBits) != 0) break;
-    pos += 8;
-    chars += 8;
-  }
   while (pos < bytes.size() && chars < max_chars) {
     if (static_cast<unsigned char>(bytes[pos]) < 0x80) {
       ++pos;

@@ -684,10 +684,13 @@ void CShareDatabase::CacheColumns() {
                                           "CacheColumns", nullptr);
     }
     cache_valid_ = false;
+    if (!row_available_) {
+      throw CShareDatabaseException::Text("No current row", "CacheColumns", nullptr);
+    }
     for (int i = 1; i <= column_count_; ++i) {
       const auto slot = static_cast<std::size_t>(i - 1);
       CValue& value = cache_[slot];
-      const int result = GetColumnValue(i, value, false, 0);
+      const int result = ReadColumn(i, value, false);
       cache_null_[slot] = result == kValueNull;
       // Only a copy this read made is the cache's to remove: the current
       // statement's column decides, not the one the cache was allocated for.

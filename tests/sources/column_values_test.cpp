@@ -75,6 +75,14 @@ TEST(ColumnConversion, ToIntegerTakesOnlyWholeNumbersWithin32Bits) {
     EXPECT_EQ(ErrorOf(Narrow(bad), VALUE_TYPE::Integer), kCannotConvert) << bad;
   }
   EXPECT_EQ(ErrorOf(Wide(u"\u0661\u0662"), VALUE_TYPE::Integer), kCannotConvert);
+  // Integer columns are parsed in 64 bits first.
+  int64_t wide_value = 0;
+  EXPECT_TRUE(ParseInteger64("-9223372036854775808", wide_value));
+  EXPECT_EQ(wide_value, INT64_MIN);
+  EXPECT_TRUE(ParseInteger64(" 9223372036854775807", wide_value));
+  EXPECT_EQ(wide_value, INT64_MAX);
+  EXPECT_FALSE(ParseInteger64("9223372036854775808", wide_value));
+  EXPECT_FALSE(ParseInteger64("-9223372036854775809", wide_value));
 
   // Doubles truncate toward zero and must land in range.
   EXPECT_EQ(Convert(Dbl(3.9), VALUE_TYPE::Integer).GetInteger(), 3);

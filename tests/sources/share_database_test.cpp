@@ -384,7 +384,7 @@ TEST_F(DatabaseTest, BinaryColumnWithoutWorkFolderFailsWithTheCause) {
     FAIL() << "the copy cannot be made";
   } catch (CShareDatabaseException& e) {
     EXPECT_EQ(e.GetEntries().front().text,
-              u"General Error (Module:ShareDatabase,Method:GetColumnValue)");
+              u"General Error (Module:ShareDatabase,Method:CacheColumns)");
     EXPECT_NE(FullText(e).find("Data path is not set"), std::string::npos) << FullText(e);
   }
 }

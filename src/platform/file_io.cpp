@@ -5,6 +5,9 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdio>
+#include <filesystem>
+#include <system_error>
 
 namespace qm::platform {
 
@@ -74,6 +77,85 @@ int64_t FileSize(int fd) {
 bool FileExists(const std::string& path) {
   struct stat st {};
   return ::stat(path.c_str(), &st) == 0;
+}
+
+FileHandle OpenFileAs(const std::string& path, FileAccess access, FileDisposition disposition,
+                      unsigned attributes) {
+  int flags = access == FileAccess::Read ? O_RDONLY : access == FileAccess::Write ? O_WRONLY : O_RDWR;
+  switch (disposition) {
+    case FileDisposition::CreateAlways:
+      flags |= O_CREAT | O_TRUNC;
+      break;
+    case FileDisposition::OpenAlways:
+      flags |= O_CREAT;
+      break;
+    case FileDisposition::OpenExisting:
+      break;
+    case FileDisposition::CreateNew:
+      flags |= O_CREAT | O_EXCL;
+      break;
+  }
+  // O_TRUNC needs write access; a read-only create-always still empties the file.
+  if ((flags & O_TRUNC) != 0 && access == FileAccess::Read) flags = (flags & ~O_RDONLY) | O_RDWR;
+  FileHandle file = OpenFile(path, flags, 0666);
+  if (!file.IsOpen()) return file;
+  if ((attributes & kFileAttributeSequentialScan) != 0) {
+    ::posix_fadvise(file.Get(), 0, 0, POSIX_FADV_SEQUENTIAL);
+  }
+  if ((attributes & kFileAttributeDeleteOnClose) != 0) ::unlink(path.c_str());
+  return file;
+}
+
+ssize_t ReadFull(int fd, void* data, std::size_t n) {
+  char* p = static_cast<char*>(data);
+  std::size_t done = 0;
+  while (done < n) {
+    const ssize_t r = ReadSome(fd, p + done, n - done);
+    if (r < 0) return -1;
+    if (r == 0) break;
+    done += static_cast<std::size_t>(r);
+  }
+  return static_cast<ssize_t>(done);
+}
+
+bool WriteAllAt(int fd, const void* data, std::size_t n, int64_t offset) {
+  const char* p = static_cast<const char*>(data);
+  while (n > 0) {
+    const ssize_t w = ::pwrite(fd, p, n, static_cast<off_t>(offset));
+    if (w < 0) {
+      if (errno == EINTR) continue;
+      return false;
+    }
+    p += w;
+    n -= static_cast<std::size_t>(w);
+    offset += w;
+  }
+  return true;
+}
+
+int64_t SeekFile(int fd, int64_t offset, SeekFrom from) {
+  const int whence = from == SeekFrom::Begin ? SEEK_SET : from == SeekFrom::Current ? SEEK_CUR : SEEK_END;
+  return static_cast<int64_t>(::lseek(fd, static_cast<off_t>(offset), whence));
+}
+
+bool SyncFileData(int fd) { return ::fdatasync(fd) == 0; }
+
+int RenameFile(const std::string& from, const std::string& to) {
+  return ::rename(from.c_str(), to.c_str()) == 0 ? 0 : errno;
+}
+
+int UnlinkFile(const std::string& path) { return ::unlink(path.c_str()) == 0 ? 0 : errno; }
+
+int MakeDirectories(const std::string& path) {
+  std::error_code ec;
+  std::filesystem::create_directories(path, ec);
+  if (ec) return ec.value();
+  return IsDirectory(path) ? 0 : ENOTDIR;
+}
+
+bool IsDirectory(const std::string& path) {
+  struct stat st {};
+  return ::stat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
 }
 
 }  // namespace qm::platform

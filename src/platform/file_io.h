@@ -52,4 +52,50 @@ int64_t FileSize(int fd);
 
 bool FileExists(const std::string& path);
 
+// --- opening with the engine's dispositions ---
+
+enum class FileAccess { Read, Write, ReadWrite };
+
+enum class FileDisposition {
+  CreateAlways,  // create, or truncate an existing file
+  OpenAlways,    // open, creating the file when missing
+  OpenExisting,  // open; fails when missing
+  CreateNew,     // create; fails when the name exists (O_EXCL)
+};
+
+// Attribute bits. Hidden has no effect here; sequential scan is a read-ahead
+// hint; delete-on-close unlinks the name as soon as the file is open.
+enum FileAttribute : unsigned {
+  kFileAttributeNormal = 0,
+  kFileAttributeHidden = 1u << 0,
+  kFileAttributeSequentialScan = 1u << 1,
+  kFileAttributeDeleteOnClose = 1u << 2,
+};
+
+// Files are created mode 0666 (less the umask). On failure the handle is
+// closed and errno set.
+FileHandle OpenFileAs(const std::string& path, FileAccess access, FileDisposition disposition,
+                      unsigned attributes = kFileAttributeNormal);
+
+// Reads until n bytes or the end of the file; returns the count or -1.
+ssize_t ReadFull(int fd, void* data, std::size_t n);
+
+// Writes all bytes at an absolute offset, leaving the file position alone.
+bool WriteAllAt(int fd, const void* data, std::size_t n, int64_t offset);
+
+enum class SeekFrom { Begin, Current, End };
+// Returns the new position, or -1.
+int64_t SeekFile(int fd, int64_t offset, SeekFrom from);
+
+// Pushes written data to the device; false on failure.
+bool SyncFileData(int fd);
+
+// Each returns 0 or the errno of the failure.
+int RenameFile(const std::string& from, const std::string& to);
+int UnlinkFile(const std::string& path);
+// Creates the folder and any missing parents; an existing folder is fine.
+int MakeDirectories(const std::string& path);
+
+bool IsDirectory(const std::string& path);
+
 }  // namespace qm::platform

@@ -10,11 +10,22 @@ constexpr char32_t kReplacement = 0xFFFD;
 
 bool IsContinuation(unsigned char b) { return (b & 0xC0) == 0x80; }
 
+bool IsEncodable(char32_t c) { return c <= 0x10FFFF && (c < 0xD800 || c > 0xDFFF); }
+
+// Length of the sequence a lead byte announces (1 for anything that is not a lead).
+std::size_t SequenceLength(unsigned char b) {
+  if ((b & 0xE0) == 0xC0) return 2;
+  if ((b & 0xF0) == 0xE0) return 3;
+  if ((b & 0xF8) == 0xF0) return 4;
+  return 1;
+}
+
 }  // namespace
 
 char32_t DecodeUtf8(std::string_view text, std::size_t& pos) {
   const auto* s = reinterpret_cast<const unsigned char*>(text.data());
   const std::size_t n = text.size();
+  if (pos >= n) return kReplacement;  // nothing left to decode; pos stays
   const unsigned char b0 = s[pos];
   if (b0 < 0x80) {
     ++pos;
@@ -47,6 +58,7 @@ char32_t DecodeUtf8(std::string_view text, std::size_t& pos) {
 }
 
 void EncodeUtf8(char32_t c, std::string& out) {
+  if (!IsEncodable(c)) c = kReplacement;
   if (c < 0x80) {
     out.push_back(static_cast<char>(c));
   } else if (c < 0x800) {
@@ -65,6 +77,7 @@ void EncodeUtf8(char32_t c, std::string& out) {
 }
 
 void EncodeUtf16(char32_t c, std::u16string& out) {
+  if (!IsEncodable(c)) c = kReplacement;
   if (c < 0x10000) {
     out.push_back(static_cast<char16_t>(c));
   } else {
@@ -171,16 +184,26 @@ std::string ToUpper(std::string_view utf8) { return MapUtf8(utf8, ToUpperCodePoi
 std::string ToLower(std::string_view utf8) { return MapUtf8(utf8, ToLowerCodePoint); }
 
 void ToUpperInPlace(std::u16string& text) {
-  for (auto& ch : text) {
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const char16_t ch = text[i];
     if (ch < 0x80) {
-      if (ch >= u'a' && ch <= u'z') ch = static_cast<char16_t>(ch - 32);
+      if (ch >= u'a' && ch <= u'z') text[i] = static_cast<char16_t>(ch - 32);
     } else if (ch < 0xD800 || ch > 0xDFFF) {
       const char32_t m = ToUpperCodePoint(ch);
-      if (m < 0x10000) ch = static_cast<char16_t>(m);
+      if (m < 0x10000) text[i] = static_cast<char16_t>(m);
+    } else if (ch <= 0xDBFF && i + 1 < text.size() && text[i + 1] >= 0xDC00 &&
+               text[i + 1] <= 0xDFFF) {
+      // A supplementary character maps within the supplementary planes, so the
+      // pair is rewritten in place and the text keeps its length.
+      const char32_t c = 0x10000 + ((ch - 0xD800) << 10) + (text[i + 1] - 0xDC00);
+      const char32_t m = ToUpperCodePoint(c);
+      if (m >= 0x10000 && m <= 0x10FFFF) {
+        text[i] = static_cast<char16_t>(0xD800 + ((m - 0x10000) >> 10));
+        text[i + 1] = static_cast<char16_t>(0xDC00 + ((m - 0x10000) & 0x3FF));
+      }
+      ++i;
     }
   }
-  // Supplementary characters keep their case: none of them has a BMP upper case,
-  // and the rare ones with a supplementary upper case are left alone.
 }
 
 std::string AsciiUpper(std::string_view text) {
@@ -193,9 +216,16 @@ std::string AsciiUpper(std::string_view text) {
 
 std::size_t Utf8CutLength(std::string_view text, std::size_t max_bytes) {
   if (text.size() <= max_bytes) return text.size();
-  std::size_t n = max_bytes;
-  while (n > 0 && IsContinuation(static_cast<unsigned char>(text[n]))) --n;
-  return n;
+  // Look back at most three bytes for the lead byte of the character that the
+  // cut falls into; cut before it only if its sequence reaches past the cut.
+  // Stray continuation bytes belong to no character and are cut anywhere.
+  const auto* s = reinterpret_cast<const unsigned char*>(text.data());
+  for (std::size_t back = 1; back <= 3 && back <= max_bytes; ++back) {
+    const std::size_t lead = max_bytes - back;
+    if (IsContinuation(s[lead])) continue;
+    return lead + SequenceLength(s[lead]) > max_bytes ? lead : max_bytes;
+  }
+  return max_bytes;
 }
 
 std::size_t Utf16CutLength(std::u16string_view text, std::size_t max_units) {

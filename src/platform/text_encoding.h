@@ -32,8 +32,10 @@ std::size_t Utf8CutLength(std::string_view text, std::size_t max_bytes);
 // Largest length <= max_units that does not cut a surrogate pair.
 std::size_t Utf16CutLength(std::u16string_view text, std::size_t max_units);
 
-// Decodes one code point at text[pos], advancing pos; invalid bytes give U+FFFD.
+// Decodes one code point at text[pos], advancing pos by at least one byte;
+// invalid bytes give U+FFFD. At the end of text it returns U+FFFD and leaves pos.
 char32_t DecodeUtf8(std::string_view text, std::size_t& pos);
+// Surrogates and values above U+10FFFF are written as U+FFFD.
 void EncodeUtf8(char32_t c, std::string& out);
 void EncodeUtf16(char32_t c, std::u16string& out);
 

@@ -9,7 +9,12 @@
 namespace qm {
 
 struct CStrNames {
+  static constexpr const char* kCtor = "CStr::CStr";
+  static constexpr const char* kTraceTag = "ShareLib.Value.CStr";
   static constexpr const char* kSCopy = "CStr::SCopy";
+  static constexpr const char* kSCat = "CStr::SCopy";
+  static constexpr const char* kAddChar = "CStr::AddChar";
+  static constexpr const char* kReserve = "CStr::Reserve";
   static constexpr const char* kSCopy0 = "CStr::SCopy0";
   static constexpr const char* kGetChar = "CStr::GetChar";
   static constexpr const char* kReplaceChar = "CStr::ReplaceChar";

@@ -10,7 +10,12 @@
 namespace qm {
 
 struct CWStrNames {
+  static constexpr const char* kCtor = "CWStr::CWStr";
+  static constexpr const char* kTraceTag = "ShareLib.Value.CWStr";
   static constexpr const char* kSCopy = "CWStr::SCopy";
+  static constexpr const char* kSCat = "CWStr::SCat";
+  static constexpr const char* kAddChar = "CWStr::AddChar";
+  static constexpr const char* kReserve = "CWStr::Reserve";
   static constexpr const char* kSCopy0 = "CWStr::SCopy0";
   static constexpr const char* kGetChar = "CWStr::GetChar";
   static constexpr const char* kReplaceChar = "CWStr::ReplaceChar";

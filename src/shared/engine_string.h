@@ -4,26 +4,46 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
+#include <new>
 #include <string>
 #include <string_view>
 
+#include "shared/checked_allocation.h"
 #include "shared/exception_family.h"
+#include "shared/trace.h"
 
 namespace qm {
 
+// Names supplies the method names of the errors (kCtor, kSCopy, kSCopy0, kSCat,
+// kAddChar, kGetChar, kReplaceChar, kReserve) and the trace tag of a failed
+// construction (kTraceTag). Every failure is a general error of module "Value".
 template <class Char, class Names>
 class EngineString {
  public:
   using View = std::basic_string_view<Char>;
   using String = std::basic_string<Char>;
 
-  EngineString() : capacity_(kDefaultCapacity) { text_.reserve(kDefaultCapacity); }
-  explicit EngineString(View text) : text_(text), capacity_(text.size() + 1), is_set_(true) {}
+  EngineString() : capacity_(kDefaultCapacity) {
+    try {
+      ReserveChecked(text_, kDefaultCapacity);
+    } catch (const std::bad_alloc&) {
+      FailConstruction("Could not allocate memory 1, aborting");
+    }
+  }
+  explicit EngineString(View text) : capacity_(text.size() + 1), is_set_(true) {
+    try {
+      ReserveChecked(text_, capacity_);
+      text_.assign(text);
+    } catch (const std::bad_alloc&) {
+      FailConstruction("Could not allocate memory 2, aborting");
+    }
+  }
   explicit EngineString(const Char* text) : EngineString(View(text ? text : EmptyText())) {}
 
-  // Assign the first len units of text (all of it by default).
+  // Assign text; grows to exactly its length + 1 when needed.
   void SCopy(View text) {
-    GrowTo(text.size() + 1);
+    GrowTo(text.size() + 1, Names::kSCopy);
     text_.assign(text);
     is_set_ = true;
   }
@@ -35,16 +55,19 @@ class EngineString {
   // Assign the first n units of source.
   void SCopy0(View source, std::size_t n) {
     if (n > source.size()) throw Exception::General(Names::kSCopy0, nullptr);
-    SCopy(source.substr(0, n));
+    GrowTo(n + 1, Names::kSCopy0);
+    text_.assign(source.substr(0, n));
+    is_set_ = true;
   }
   // Append text; grows to exactly the new length + 1 (+1 more when terminating).
   void SCat(View text, bool terminate = true) {
-    GrowTo(Length() + text.size() + 1 + (terminate ? 1 : 0));
+    GrowTo(Length() + text.size() + 1 + (terminate ? 1 : 0), Names::kSCat);
     text_.append(text);
     is_set_ = true;
   }
+  // Appends one unit; a full string grows to its length + 11.
   void AddChar(Char c) {
-    if (Length() + 1 >= capacity_) GrowTo(Length() + 11);
+    if (Length() + 1 >= capacity_) GrowTo(Length() + 11, Names::kAddChar);
     text_.push_back(c);
     is_set_ = true;
   }
@@ -59,9 +82,14 @@ class EngineString {
   }
   // Keeps the text while capacity >= n + 5; otherwise reallocates to n and empties it.
   void Reserve(std::size_t n) {
-    if (capacity_ >= n + 5) return;
+    if (n <= SIZE_MAX - 5 && capacity_ >= n + 5) return;
+    try {
+      if (n > SIZE_MAX - 5) throw std::bad_alloc();
+      ReserveChecked(text_, n + 5);
+    } catch (const std::bad_alloc&) {
+      throw Exception::General(Names::kReserve, nullptr);
+    }
     text_.clear();
-    text_.reserve(n + 5);
     capacity_ = n;
   }
   // Removes units of set from the end (mode 1), the start (mode 2) or both (mode 0).
@@ -89,11 +117,18 @@ class EngineString {
   using Exception = CValueException;
   static constexpr std::size_t kDefaultCapacity = 200;
 
-  void GrowTo(std::size_t units) {
-    if (capacity_ < units) {
-      text_.reserve(units);
-      capacity_ = units;
+  void GrowTo(std::size_t units, const char* method) {
+    if (capacity_ >= units) return;
+    try {
+      ReserveChecked(text_, units);
+    } catch (const std::bad_alloc&) {
+      throw Exception::General(method, nullptr);
     }
+    capacity_ = units;
+  }
+  [[noreturn]] static void FailConstruction(std::string_view message) {
+    Trace(true, Names::kTraceTag, message);
+    throw Exception::General(Names::kCtor, nullptr);
   }
   static const Char* EmptyText() {
     static const Char empty[1] = {Char(0)};

@@ -8,6 +8,7 @@
 
 #include "platform/config_store.h"
 #include "platform/file_io.h"
+#include "platform/text_encoding.h"
 
 namespace qm {
 
@@ -72,9 +73,13 @@ std::string LibraryDataFolder() {
 
 std::map<int32_t, ErrorEntry> ParseErrorMessages(const std::string& bytes) {
   std::map<int32_t, ErrorEntry> table;
+  // The file is UTF-16LE behind a byte-order mark; a file saved without the
+  // mark loses nothing.
+  const std::size_t start =
+      bytes.size() >= 2 && bytes[0] == '\xFF' && bytes[1] == '\xFE' ? 2 : 0;
   std::u16string text;
   text.reserve(bytes.size() / 2);
-  for (std::size_t i = 2; i + 1 < bytes.size(); i += 2) {  // skip the byte-order mark
+  for (std::size_t i = start; i + 1 < bytes.size(); i += 2) {
     text.push_back(static_cast<char16_t>(static_cast<unsigned char>(bytes[i]) |
                                          (static_cast<unsigned char>(bytes[i + 1]) << 8)));
   }
@@ -85,14 +90,14 @@ std::map<int32_t, ErrorEntry> ParseErrorMessages(const std::string& bytes) {
     if (end == std::u16string::npos) end = text.size();
     std::u16string_view line(text.data() + pos, end - pos);
     pos = end + 1;
-    if (line.size() > kMaxLineUnits) line = line.substr(0, kMaxLineUnits);
-    while (!line.empty() && (line.back() == u'\r' || line.back() == u'\n')) line.remove_suffix(1);
+    line = line.substr(0, Utf16CutLength(line, kMaxLineUnits));
 
     if (StartsWith(line, u"[END]")) continue;
     if (!in_messages) {
       in_messages = StartsWith(line, u"[ERROR MESSAGES]");
       continue;
     }
+    // number,level,text - the text runs to the line end and may hold commas.
     const auto c1 = line.find(u',');
     if (c1 == std::u16string_view::npos) break;
     const auto c2 = line.find(u',', c1 + 1);
@@ -102,8 +107,9 @@ std::map<int32_t, ErrorEntry> ParseErrorMessages(const std::string& bytes) {
     if (!ParseDecimal(line.substr(0, c1), number) || number == 0) break;
     if (!ParseDecimal(line.substr(c1 + 1, c2 - c1 - 1), level) || level == 0) break;
     std::u16string_view message = line.substr(c2 + 1);
+    message = message.substr(0, message.find(u'\r'));
     if (message.empty()) break;
-    if (message.size() > kMaxTextUnits) message = message.substr(0, kMaxTextUnits);
+    message = message.substr(0, Utf16CutLength(message, kMaxTextUnits));
     table.try_emplace(number, ErrorEntry{std::u16string(message), number, level});
   }
   return table;

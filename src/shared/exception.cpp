@@ -74,7 +74,7 @@ void CExceptionBase::BuildUnknown(std::string_view module, const char* method,
         std::u16string(WidenMessage(method ? method : "")));
 }
 
-const std::u16string& CExceptionBase::GetFullText(int32_t max_level) {
+const std::u16string& CExceptionBase::GetFullText(int32_t max_level) const {
   auto join = [this](int32_t level) {
     std::u16string out;
     for (const auto& e : entries_) {
@@ -97,7 +97,7 @@ const std::u16string& CExceptionBase::GetFullText(int32_t max_level) {
   return full_text_;
 }
 
-std::string CExceptionBase::GetFullTextUtf8(int32_t max_level) {
+std::string CExceptionBase::GetFullTextUtf8(int32_t max_level) const {
   return Utf16ToUtf8(GetFullText(max_level));
 }
 

@@ -35,8 +35,10 @@ class CExceptionBase {
 
   // Joins the chain's texts up to maxLevel, each followed by "\r\n"; falls back
   // to level 200, and then to every entry, so a failure is never reported empty.
-  const std::u16string& GetFullText(int32_t max_level);
-  std::string GetFullTextUtf8(int32_t max_level);
+  // Const so a handler holding a const reference can report; it only refreshes
+  // the stored full text.
+  const std::u16string& GetFullText(int32_t max_level) const;
+  std::string GetFullTextUtf8(int32_t max_level) const;
 
  protected:
   void BuildGeneral(std::string_view module, const char* method, const CExceptionBase* inner);
@@ -52,7 +54,7 @@ class CExceptionBase {
 
   ErrorEntry current_;
   std::vector<ErrorEntry> entries_;
-  std::u16string full_text_;
+  mutable std::u16string full_text_;
   std::u16string reserved_;
   int32_t error_number_ = 1;
 };

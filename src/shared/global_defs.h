@@ -3,10 +3,13 @@
 // folder kinds of the home and data trees with their placeholders.
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <mutex>
 #include <string>
 #include <string_view>
+
+#include "shared/connection_scramble.h"
 
 namespace qm {
 
@@ -32,6 +35,23 @@ enum class FolderKind : int32_t {
   Groups = 18,
 };
 
+// The kinds below the data root, for whoever lays out a data directory.
+inline constexpr std::array<FolderKind, 14> kDataFolderKinds = {
+    FolderKind::Data,        FolderKind::Language,    FolderKind::Converters,
+    FolderKind::Groups,      FolderKind::Group,       FolderKind::Indexes,
+    FolderKind::Orders,      FolderKind::GroupConfig, FolderKind::Repositories,
+    FolderKind::Repositories2, FolderKind::Definitions, FolderKind::Queries,
+    FolderKind::WorkData,    FolderKind::DataStore,
+};
+
+// Placeholders as stored, each with its backslash.
+inline constexpr std::string_view kPlaceholderHome = "[QUILLMERE_HOME]\\";
+inline constexpr std::string_view kPlaceholderConfig = "[QUILLMERE_CONFIG]\\";
+inline constexpr std::string_view kPlaceholderData = "[QUILLMERE_DATA]\\";
+inline constexpr std::string_view kPlaceholderDataGroup = "[QUILLMERE_DATA_GROUP]\\";
+inline constexpr std::string_view kPlaceholderDataConverters = "[QUILLMERE_DATA_CONVERTERS]\\";
+inline constexpr std::string_view kPlaceholderDataStore = "[QUILLMERE_DATA_STORE]\\";
+
 enum class ConnectionMode : int32_t { Dsn = 0, ConnectionString = 1 };
 
 class CGlobalDefs {
@@ -42,19 +62,29 @@ class CGlobalDefs {
   CGlobalDefs(const CGlobalDefs& other);
   CGlobalDefs& operator=(const CGlobalDefs& other);
 
-  // --- folders (paths end in "/") ---
-  // Home part; with placeholder, "[QUILLMERE_HOME]\" instead of the configured home.
+  // --- folders (paths end in "/"; the configured values are read on every call) ---
+  // Home kinds (8, 10, 11, 14, 15). With placeholder, "[QUILLMERE_HOME]\"
+  // stands for the home; with no home configured the result is empty.
   std::string GetHomePath(FolderKind kind, bool placeholder = false) const;
-  // Data part; raises STDFUN "Data path is not set" when no root is known.
+  // As GetHomePath, but raises STDFUN "Home path is not set" (naming method)
+  // when no home is configured: for operations that would otherwise write
+  // relative to the working folder.
+  std::string GetHomePathRequired(FolderKind kind, const char* method) const;
+  // Data kinds. The root is the caller's data path, else (with placeholder)
+  // "[QUILLMERE_HOME]\Data/", else the configured "path"; raises STDFUN
+  // "Data path is not set" when there is none. Group folder names are
+  // upper-cased.
   std::string GetFullDataPath(FolderKind kind, bool placeholder = false) const;
-  // Dispatches by kind.
+  // Dispatches by kind; an unknown kind raises.
   std::string GetFolder(FolderKind kind, bool placeholder = false) const;
-  // Replaces every placeholder by its folder (HOME, DATA, DATA_GROUP,
-  // DATA_CONVERTERS, DATA_STORE, in this order).
+  // Replaces every placeholder by its folder (HOME, CONFIG, DATA, DATA_GROUP,
+  // DATA_CONVERTERS, DATA_STORE, in this order); a folder is resolved only
+  // when its placeholder occurs.
   std::string ExpandPlaceholders(std::string_view text) const;
   // Replaces only the home and home-config placeholders.
   std::string ExpandHomePlaceholders(std::string_view text) const;
-  // Replaces the data root by "[QUILLMERE_DATA]\", keeping the rest as it is.
+  // Replaces each occurrence of the data root (spelled exactly) by
+  // "[QUILLMERE_DATA]\", keeping the rest of the text as it is.
   std::string CollapseDataPath(std::string_view text) const;
 
   // --- data path and group ---
@@ -78,6 +108,10 @@ class CGlobalDefs {
   std::string GetUserId() const;
   std::string GetPassword() const;
 
+  // The display name rule of a connection string: the value of "DSN=", else of
+  // "DB=", upper-cased; "No Display Name" when neither occurs.
+  static std::string DisplayNameOf(std::string_view connection_string);
+
   // --- trace flags read at construction ---
   bool TraceLevel1() const { return trace1_; }
   bool TraceLevel2() const { return trace2_; }
@@ -88,7 +122,16 @@ class CGlobalDefs {
   static constexpr int32_t kMajorVersion = 6;
   static constexpr int32_t kFileVersion = 601;
 
+  // --- progress of the job these settings belong to ---
+  // A job's progress never goes backwards: SetProgress keeps the highest value
+  // reached since the last ResetProgress.
+  void ResetProgress();
+  void SetProgress(int32_t percent);
+  int32_t GetProgress() const;
+
  private:
+  mutable std::mutex progress_mutex_;  // guards the progress only
+  int32_t progress_ = 0;
   mutable std::mutex mutex_;  // guards every field below
   std::string data_path_;
   std::string connection_string_;
@@ -104,16 +147,6 @@ class CGlobalDefs {
   bool trace3_ = false;
 };
 
-// Temporary names: "tmpxxxx_" + caller + "_" + counter, the counter kept in
-// generator.dat under the kind 8 writer lock.
-std::string SLGetTempFileName(const CGlobalDefs& defs, bool group_scope, int32_t caller);
-// A WorkData path that does not exist yet, ending in ".tmp" or in the extension
-// of source_name when given (and usable); the file is created exclusively.
-std::string SLGetTempWorkFilePath(const CGlobalDefs& defs, int32_t caller,
-                                  std::string_view source_name = {});
-std::string SLGetTempConfigFilePath(const CGlobalDefs& defs, int32_t caller);
-
-// The keyless byte substitution of connection texts; its own inverse.
-void ScrambleConnectionText(std::string& text);
-
 }  // namespace qm
+
+#include "shared/temp_names.h"

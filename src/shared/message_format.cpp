@@ -24,6 +24,9 @@ void AppendArg(const FormatArg& arg, std::u16string& out) {
     case FormatArg::Kind::Integer:
       for (char c : std::to_string(arg.integer)) out.push_back(static_cast<char16_t>(c));
       break;
+    case FormatArg::Kind::Unsigned:
+      for (char c : std::to_string(arg.unsigned_integer)) out.push_back(static_cast<char16_t>(c));
+      break;
   }
 }
 
@@ -37,6 +40,9 @@ void AppendArg(const FormatArg& arg, std::string& out) {
       break;
     case FormatArg::Kind::Integer:
       out.append(std::to_string(arg.integer));
+      break;
+    case FormatArg::Kind::Unsigned:
+      out.append(std::to_string(arg.unsigned_integer));
       break;
   }
 }

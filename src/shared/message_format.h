@@ -20,11 +20,12 @@ class CStr;
 class CWStr;
 
 struct FormatArg {
-  enum class Kind { Narrow, Wide, Integer };
+  enum class Kind { Narrow, Wide, Integer, Unsigned };
   Kind kind = Kind::Integer;
   std::string_view narrow;
   std::u16string_view wide;
   long long integer = 0;
+  unsigned long long unsigned_integer = 0;
 
   FormatArg(const char* s) : kind(Kind::Narrow), narrow(s ? s : "") {}
   FormatArg(char* s) : FormatArg(static_cast<const char*>(s)) {}
@@ -37,7 +38,15 @@ struct FormatArg {
   FormatArg(const CStr& s);
   FormatArg(const CWStr& s);
   template <class T, std::enable_if_t<std::is_integral_v<T> || std::is_enum_v<T>, int> = 0>
-  FormatArg(T v) : kind(Kind::Integer), integer(static_cast<long long>(v)) {}
+  FormatArg(T v) {
+    using U = std::conditional_t<std::is_enum_v<T>, std::underlying_type<T>, std::type_identity<T>>;
+    if constexpr (std::is_unsigned_v<typename U::type>) {
+      kind = Kind::Unsigned;
+      unsigned_integer = static_cast<unsigned long long>(v);
+    } else {
+      integer = static_cast<long long>(v);
+    }
+  }
 };
 
 // Exception texts are cut at 2,047 UTF-16 units, trace messages at 1,023 bytes.

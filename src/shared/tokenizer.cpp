@@ -30,6 +30,7 @@ bool GetToken(std::string& source, std::string& token, char delimiter, bool drop
       token.push_back(c);
     }
   }
+  token.clear();  // no delimiter ended it: no token
   return false;
 }
 

@@ -10,7 +10,8 @@ namespace qm {
 // outside double quotes and "#...#" date quotes. Two double quotes in a row
 // give one; a single one toggles quoting and is kept; "#" toggles date quoting
 // and is dropped with drop_hash. When a delimiter ends the token, source keeps
-// what follows it and the result is true; when source ends first, false.
+// what follows it and the result is true; when source ends first, the result
+// is false, token is empty and source is left as it was.
 bool GetToken(std::string& source, std::string& token, char delimiter, bool drop_hash);
 
 // Skips leading characters of set and copies up to the next one; removes token

@@ -39,8 +39,10 @@ void WriteLineToModuleFile(const std::string& base, const std::string& line) {
   const long long limit = g_file_limit.load();
   std::string path = base + ".log";
   for (int n = 1;; ++n) {
+    // O_NONBLOCK: a FIFO planted under a trace name fails the open instead of
+    // hanging the tracer; regular files ignore the flag.
     platform::FileHandle file =
-        platform::OpenFile(path, O_WRONLY | O_CREAT | O_APPEND, 0666);
+        platform::OpenFile(path, O_WRONLY | O_CREAT | O_APPEND | O_NONBLOCK, 0666);
     if (!file.IsOpen()) return;
     if (platform::FileSize(file.Get()) <= limit || n > 100000) {
       // One write() on an O_APPEND file: concurrent tracers never interleave.
@@ -55,6 +57,21 @@ void WriteLineToModuleFile(const std::string& base, const std::string& line) {
 
 void SetTraceFileLimitForTesting(long long bytes) { g_file_limit = bytes; }
 
+std::string TraceDate(const std::tm& t) {
+  return std::to_string(t.tm_year + 1900) + "-" + std::to_string(t.tm_mon + 1) + "-" +
+         std::to_string(t.tm_mday);
+}
+
+std::string TraceLine(const std::tm& t, std::string_view area, std::string_view message) {
+  std::string line = TraceDate(t) + " " + std::to_string(t.tm_hour) + ":" +
+                     std::to_string(t.tm_min) + ":" + std::to_string(t.tm_sec) + " ";
+  line.append(area);
+  line += " - ";
+  line.append(message);
+  line += "\r\n";
+  return line;
+}
+
 void TraceMessage(std::string_view tag, std::string_view message) noexcept {
   try {
     const std::string home = HomeFolder();
@@ -67,14 +84,8 @@ void TraceMessage(std::string_view tag, std::string_view message) noexcept {
     const std::time_t now = std::time(nullptr);
     std::tm t{};
     localtime_r(&now, &t);
-    const std::string date = std::to_string(t.tm_year + 1900) + "-" + std::to_string(t.tm_mon + 1) +
-                             "-" + std::to_string(t.tm_mday);
-    std::string line = date + " " + std::to_string(t.tm_hour) + ":" + std::to_string(t.tm_min) +
-                       ":" + std::to_string(t.tm_sec) + " ";
-    line.append(area);
-    line += " - ";
-    line.append(message);
-    line += "\r\n";
+    const std::string date = TraceDate(t);
+    const std::string line = TraceLine(t, area, message);
 
     std::size_t start = 0;
     while (start <= modules.size()) {

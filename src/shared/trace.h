@@ -3,6 +3,7 @@
 #pragma once
 
 #include <atomic>
+#include <ctime>
 #include <string>
 #include <string_view>
 
@@ -37,6 +38,11 @@ void Trace(bool flag, std::string_view tag, std::string_view format, const A&...
     // Tracing must never replace the failure being reported.
   }
 }
+
+// The day part of a trace file name and the line written for one call, both
+// without leading zeros: "2004-3-9" and "2004-3-9 14:5:7 Block.InsertRow - text\r\n".
+std::string TraceDate(const std::tm& when);
+std::string TraceLine(const std::tm& when, std::string_view area, std::string_view message);
 
 // The trace roll-over limit: a day's file above this many bytes continues in
 // base_1.log, base_2.log, ... Adjustable only for tests.

@@ -1,9 +1,11 @@
 #include "shared/value.h"
 
 #include <cmath>
+#include <cstdint>
 #include <limits>
 
 #include "platform/text_encoding.h"
+#include "shared/checked_allocation.h"
 #include "shared/exception_family.h"
 #include "shared/trace.h"
 
@@ -69,19 +71,31 @@ int TakeMeridiem(std::string& field) {
 
 }  // namespace
 
-void CValue::ReserveNarrow(std::size_t n) {
-  if (narrow_capacity_ < n + kStringSlack) {
-    narrow_.reserve(n + kStringSlack);
-    narrow_capacity_ = n + kStringSlack;
+namespace {
+
+// Makes room for n units plus the slack; false when that cannot be allocated.
+template <class String>
+bool ReserveWithSlack(String& text, std::size_t& capacity, std::size_t n) {
+  if (n > SIZE_MAX - kStringSlack) return false;
+  if (capacity >= n + kStringSlack) return true;
+  try {
+    ReserveChecked(text, n + kStringSlack);
+  } catch (const std::bad_alloc&) {
+    return false;
   }
+  capacity = n + kStringSlack;
+  return true;
+}
+
+}  // namespace
+
+void CValue::ReserveNarrow(std::size_t n) {
+  if (!ReserveWithSlack(narrow_, narrow_capacity_, n)) throw CValueException::General("PreStr");
   type_ = VALUE_TYPE::AsciiString;
 }
 
 void CValue::ReserveWide(std::size_t n) {
-  if (wide_capacity_ < n + kStringSlack) {
-    wide_.reserve(n + kStringSlack);
-    wide_capacity_ = n + kStringSlack;
-  }
+  if (!ReserveWithSlack(wide_, wide_capacity_, n)) throw CValueException::General("PreStrW");
   type_ = VALUE_TYPE::UnicodeString;
 }
 
@@ -178,7 +192,6 @@ void CValue::SetDateFromText(std::string_view text, bool upper_bound) {
       if (meridiem == 0 || !field.empty()) BadDate(text);
     }
     if (meridiem != 0 && d.hour <= 23) {
-      if (d.hour > 12) BadDate(text);
       if (meridiem == 2 && d.hour < 12) d.hour = static_cast<uint16_t>(d.hour + 12);
       if (meridiem == 1 && d.hour == 12) d.hour = 0;
     }
@@ -194,8 +207,9 @@ void CValue::ExtendToEnd(int precision) {
 }
 
 uint32_t CValue::DateKey() const {
-  return (static_cast<uint32_t>(static_cast<uint16_t>(date_.year)) * 256u + date_.month) * 256u +
-         date_.day;
+  // Computed signed and taken modulo 2^32, so a year before 0 keeps its key.
+  const int64_t key = (int64_t{date_.year} * 256 + date_.month) * 256 + date_.day;
+  return static_cast<uint32_t>(key);
 }
 
 uint32_t CValue::TimeKey() const {
@@ -249,8 +263,29 @@ int CValue::Match(const CValue& other) const {
   }
 }
 
+void CColumnValues::AllocateColumns() {
+  try {
+    ReserveChecked(values_, kMaxColumns + 1);
+    values_.resize(kMaxColumns + 1);
+  } catch (const std::bad_alloc&) {
+    values_.clear();
+    throw CValueException::Text("Eror allocating memory", "CColumnValues::AllocateColumns",
+                                nullptr);
+  }
+}
+
+CValue& CColumnValues::Column(std::size_t i) {
+  if (i >= count_) throw CValueException::General("CColumnValues::GetColumn");
+  return values_[i];
+}
+
+const CValue& CColumnValues::Column(std::size_t i) const {
+  if (i >= count_) throw CValueException::General("CColumnValues::GetColumn");
+  return values_[i];
+}
+
 void CColumnValues::AddColumn(VALUE_TYPE type, std::size_t size) {
-  if (values_.empty()) values_.resize(kMaxColumns + 1);
+  if (values_.empty()) AllocateColumns();
   if (count_ + 1 >= kMaxColumns + 1) {
     throw CValueException::Text("Too many table columns", "CColumnValues::AddColumn", nullptr);
   }

@@ -93,14 +93,20 @@ class CColumnValues {
   static constexpr std::size_t kMaxColumns = 99;
 
   // Adds a column of the given type; text columns reserve min(size, 2000) units.
+  // The 100th column raises "Too many table columns".
   void AddColumn(VALUE_TYPE type, std::size_t size);
   std::size_t Count() const { return count_; }
   bool IsAllocated() const { return !values_.empty(); }
-  CValue& operator[](std::size_t i) { return values_.at(i); }
-  const CValue& operator[](std::size_t i) const { return values_.at(i); }
+  // A column that was added; any other index raises a "Value" general error.
+  CValue& Column(std::size_t i);
+  const CValue& Column(std::size_t i) const;
+  CValue& operator[](std::size_t i) { return Column(i); }
+  const CValue& operator[](std::size_t i) const { return Column(i); }
   void Release();
 
  private:
+  void AllocateColumns();
+
   std::vector<CValue> values_;
   std::size_t count_ = 0;
 };

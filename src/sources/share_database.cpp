@@ -15,6 +15,7 @@
 #include "platform/text_encoding.h"
 #include "shared/exception_family.h"
 #include "shared/global_defs.h"
+#include "shared/temp_names.h"
 #include "shared/trace.h"
 #include "sources/column_conversion.h"
 #include "sources/column_text.h"

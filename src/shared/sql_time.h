@@ -1,0 +1,18 @@
+// Conversions between the platform's local time and the engine's dates.
+#pragma once
+
+#include <string>
+
+#include "platform/local_time.h"
+#include "shared/value.h"
+
+namespace qm {
+
+// The local time as a date with fraction 0.
+DateTimeValue SystemTimeToSQLTime(const platform::LocalTime& time);
+
+// "Y-M-D h:m:s" in decimal without leading zeros, then "." and the fraction
+// when asked for.
+std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction = false);
+
+}  // namespace qm

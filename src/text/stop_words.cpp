@@ -1,0 +1,20 @@
+#include "text/stop_words.h"
+
+#include "platform/text_encoding.h"
+#include "text/language_file.h"
+
+namespace qm::text {
+
+StopWordList StopWordList::FromText(std::u16string_view text) {
+  StopWordList list;
+  const auto tokens = SplitUtf16Tokens(text);
+  list.words_.reserve(tokens.size());
+  for (const auto token : tokens) {
+    std::u16string word = ToUpper(token);
+    word.resize(Utf16CutLength(word, kMaxWordLength));
+    list.words_.insert(std::move(word));
+  }
+  return list;
+}
+
+}  // namespace qm::text

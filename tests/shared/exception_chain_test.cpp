@@ -1,0 +1,271 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "shared/core_test_support.h"
+#include "shared/error_messages.h"
+#include "shared/exception_family.h"
+
+namespace qm {
+namespace {
+
+using test::EntryTexts;
+using test::ThrownTexts;
+using Texts = std::vector<std::string>;
+
+const std::string kUnknown =
+    "Unknown exception. This is a critical error, please report this problem to Morvil support";
+
+template <class... E>
+std::vector<std::string> GeneralTexts() {
+  return {test::EntryTexts(E::General(nullptr)).at(0)...};
+}
+
+TEST(ExceptionFamily, EveryModuleNamesItselfInItsGeneralError) {
+  const std::vector<std::string> texts = GeneralTexts<
+      CStreamException, CECComClientException, CSyncServersException, CPiStartPointException,
+      CPiCmdException, CHighStructuresException, CPiFIndexException, CPiOrderException,
+      CWinFileException, CPiDeleteException, CPiSortException, CPiOrderSortException,
+      CValueException, CSTDFUNException, CCollectionException, CShareDatabaseException,
+      CStringFuncUException, CBFileException, CMFileException, CFreeItemException,
+      CBlockException, CGiStartPointException, CGiTreeRowsetException, CGiCmdTreeException,
+      CGiFIndexException, CGiRepositoryException, CGiOrderException, CShareRepositoryException,
+      CShareCollectorException, CShareDefinitionException, CLanguageException,
+      CDocConverterException, CComConverterException, CConnectionException, CConverterException,
+      CLockManagerException>();
+  const char* modules[] = {
+      "Stream", "ECComClient", "SyncServers", "PiStartPoint", "PiCmd", "HighStructures",
+      "PiFIndex", "PiOrder", "WinFile", "PiDelete", "PiSort", "PiOrderSort", "Value", "STDFUN",
+      "Collection", "ShareDatabase", "StringFuncU", "BFile", "MFile", "FreeItem", "Block",
+      "GiStartPoint", "GiTreeRowset", "GiCmdTree", "GiFIndex", "GiRepository", "GiOrder",
+      "ShareRepository", "ShareCollector", "ShareDefinition", "Language", "DocConverter",
+      "ComConverter", "Connection", "Converter", "LockManager"};
+  ASSERT_EQ(texts.size(), std::size(modules));
+  for (std::size_t i = 0; i < texts.size(); ++i) {
+    EXPECT_EQ(texts[i], "General Error (Module:" + std::string(modules[i]) + ")");
+  }
+}
+
+// Builds one unknown exception of each class and returns the trace areas expected.
+template <class... U>
+std::vector<std::string> MakeUnknowns() {
+  std::vector<std::string> areas;
+  ([&] {
+    const U e = U::Unknown("Probe");
+    const std::string module(U::kModule);
+    EXPECT_EQ(EntryTexts(e), Texts{kUnknown + " (Module:" + module + ",Method:Probe)"});
+    EXPECT_EQ(e.GetEntries().at(0).level, 100);
+    areas.push_back(module == "GiTreeRowset" ? module : module + "UnknownException");
+  }(), ...);
+  return areas;
+}
+
+TEST(ExceptionFamily, UnknownExceptionsTraceUnderTheirTags) {
+  test::ConfiguredHome home;
+  const auto engine_areas = MakeUnknowns<
+      CStreamUnknownException, CECComClientUnknownException, CPiStartPointUnknownException,
+      CPiCmdUnknownException, CHighStructuresUnknownException, CPiFIndexUnknownException,
+      CPiOrderUnknownException, CPiSortUnknownException, CPiOrderSortUnknownException,
+      CShareDatabaseUnknownException, CMFileUnknownException, CGiStartPointUnknownException,
+      CGiTreeRowsetUnknownException, CGiCmdTreeUnknownException, CGiFIndexUnknownException,
+      CGiRepositoryUnknownException, CGiOrderUnknownException, CShareRepositoryUnknownException,
+      CShareCollectorUnknownException, CShareDefinitionUnknownException,
+      CLanguageUnknownException, CComConverterUnknownException>();
+  const auto converter_areas = MakeUnknowns<CDocConverterUnknownException,
+                                            CConnectionUnknownException, CConverterUnknownException>();
+  EXPECT_EQ(converter_areas, (Texts{"DocConverterUnknownException", "ConnectionUnknownException",
+                                    "ConverterUnknownException"}));
+  EXPECT_NE(std::find(engine_areas.begin(), engine_areas.end(), "GiTreeRowset"), engine_areas.end());
+
+  const std::string message = " - *** UNKNOWN EXCEPTION *** (Method:Probe)\r\n";
+  for (const char* module : {"SHARELIB", "PILIB", "GILIB", "FILIB"}) {
+    const std::string trace = test::TraceOf(home, module);
+    for (const auto& areas : {engine_areas, converter_areas}) {
+      for (const auto& area : areas) {
+        EXPECT_NE(trace.find(" " + area + message), std::string::npos) << module << " " << area;
+      }
+    }
+  }
+  // Only the converter-side classes also write to the REPLIB file.
+  const std::string replib = test::TraceOf(home, "REPLIB");
+  for (const auto& area : converter_areas) {
+    EXPECT_NE(replib.find(" " + area + message), std::string::npos) << area;
+  }
+  EXPECT_EQ(replib.find("ComConverter"), std::string::npos);
+  EXPECT_EQ(replib.find("MFile"), std::string::npos);
+}
+
+TEST(ExceptionForms, GeneralErrorWithAndWithoutMethod) {
+  const auto e = CSTDFUNException::General(nullptr);
+  ASSERT_EQ(e.GetEntries().size(), 1u);
+  EXPECT_EQ(EntryTexts(e), Texts{"General Error (Module:STDFUN)"});
+  EXPECT_EQ(e.GetEntries()[0].level, 200);
+  EXPECT_EQ(e.GetEntries()[0].number, 1);
+  EXPECT_EQ(e.GetErrorNumber(), 1);
+  EXPECT_TRUE(e.GetCurrentEntry().text.empty());
+  EXPECT_EQ(EntryTexts(CBlockException::General("ReadInt")),
+            Texts{"General Error (Module:Block,Method:ReadInt)"});
+}
+
+TEST(ExceptionForms, TextErrorFormatsItsArguments) {
+  const auto e = CSTDFUNException::Text("Error deleting file: %S", "DropFile", nullptr,
+                                        std::string("/data/a b.sdx"));
+  EXPECT_EQ(EntryTexts(e), Texts{"Error deleting file: /data/a b.sdx (Module:STDFUN,Method:DropFile)"});
+  EXPECT_EQ(e.GetEntries()[0].level, 100);
+  EXPECT_EQ(e.GetCurrentEntry().text, e.GetEntries()[0].text);
+  EXPECT_EQ(e.GetErrorNumber(), 1);
+  // Wide text, a wide argument and directives that data cannot trigger.
+  const auto w = CPiCmdException::Text(u"Bad word %s at %i", "TranslateW", nullptr,
+                                       std::u16string(u"%s%n"), 3);
+  EXPECT_EQ(EntryTexts(w), Texts{"Bad word %s%n at 3 (Module:PiCmd,Method:TranslateW)"});
+  // The whole text is cut at 2,047 units.
+  const auto longer = CPiCmdException::Text("%s", "M", nullptr, std::string(3000, 'x'));
+  EXPECT_EQ(longer.GetEntries()[0].text.size(), 2047u);
+}
+
+class NumberedErrors : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    test::WriteFile(dir_.Path() + "mrvconf.ini",
+                    test::Utf16LeFile(u"[ERROR MESSAGES]\r\n"
+                                      u"13,50,Statement error in %METHOD of %MODULE: %s %MODULE\r\n"
+                                      u"40,300,Deep detail only\r\n"));
+    ASSERT_TRUE(LoadErrorMessagesFromFile(dir_.Path() + "mrvconf.ini"));
+  }
+  void TearDown() override { LoadErrorMessages(); }
+
+  test::ScratchDir dir_;
+};
+
+TEST_F(NumberedErrors, TakeTextAndLevelFromTheTable) {
+  const auto e = CPiCmdException::Numbered(13, "TranslateW", nullptr, "near X");
+  EXPECT_EQ(EntryTexts(e), Texts{"Statement error in TranslateW of PiCmd: near X %MODULE"});
+  EXPECT_EQ(e.GetEntries()[0].level, 50);
+  EXPECT_EQ(e.GetEntries()[0].number, 13);
+  EXPECT_EQ(e.GetErrorNumber(), 13);
+  // Without a method the placeholder stays.
+  EXPECT_EQ(EntryTexts(CPiCmdException::Numbered(13, nullptr, nullptr)),
+            Texts{"Statement error in %METHOD of PiCmd: %s %MODULE"});
+}
+
+TEST_F(NumberedErrors, MissingNumberGetsTheDefaultTextAtLevel200) {
+  const auto e = CGiTreeRowsetException::Numbered(59, "SetOrder", nullptr);
+  EXPECT_EQ(EntryTexts(e), Texts{"General Error (Module:GiTreeRowset, Method:SetOrder)"});
+  EXPECT_EQ(e.GetEntries()[0].level, 200);
+  EXPECT_EQ(e.GetErrorNumber(), 59);
+  EXPECT_EQ(e.GetFullTextUtf8(100), "General Error (Module:GiTreeRowset, Method:SetOrder)\r\n");
+}
+
+TEST_F(NumberedErrors, FullTextFallsBackToEveryEntry) {
+  // Only entries above level 200: nothing at 100 or 200, so all of them.
+  const auto inner = CPiCmdException::Numbered(40, "ExecuteW", nullptr);
+  const auto outer = CPiCmdException::Numbered(40, "ExecuteW", &inner);
+  EXPECT_EQ(outer.GetFullTextUtf8(100), "Deep detail only\r\nDeep detail only\r\n");
+}
+
+TEST(ExceptionChain, InnerEntriesFollowTheNewOne) {
+  const auto cause = CWinFileException::Text("Error opening file: %S", "Open", nullptr, "x.fst");
+  const auto middle = CBlockException::General("InsertRow", &cause);
+  const auto outer = CPiFIndexException::Text("Write failed", "BuildRowFindex", &middle);
+  EXPECT_EQ(EntryTexts(outer), (Texts{"Write failed (Module:PiFIndex,Method:BuildRowFindex)",
+                                      "General Error (Module:Block,Method:InsertRow)",
+                                      "Error opening file: x.fst (Module:WinFile,Method:Open)"}));
+  EXPECT_EQ(outer.GetFullTextUtf8(100),
+            "Write failed (Module:PiFIndex,Method:BuildRowFindex)\r\n"
+            "Error opening file: x.fst (Module:WinFile,Method:Open)\r\n");
+  EXPECT_EQ(outer.GetFullTextUtf8(200),
+            "Write failed (Module:PiFIndex,Method:BuildRowFindex)\r\n"
+            "General Error (Module:Block,Method:InsertRow)\r\n"
+            "Error opening file: x.fst (Module:WinFile,Method:Open)\r\n");
+  // Only level-200 entries: the host still gets them.
+  const auto block = CBlockException::General("InsertRow");
+  const auto general = CPiCmdException::General("ExecuteW", &block);
+  EXPECT_EQ(general.GetFullTextUtf8(100),
+            "General Error (Module:PiCmd,Method:ExecuteW)\r\n"
+            "General Error (Module:Block,Method:InsertRow)\r\n");
+  // The full text is remembered, also through a const reference.
+  const CExceptionBase& ref = outer;
+  EXPECT_EQ(&ref.GetFullText(100), &ref.GetFullText(100));
+}
+
+TEST(ExceptionChain, FamiliesAreDistinctTypes) {
+  auto which = [](auto thrower) -> std::string {
+    try {
+      thrower();
+    } catch (const CBlockException&) {
+      return "block";
+    } catch (const CException&) {
+      return "exception";
+    } catch (const CUnknownException&) {
+      return "unknown";
+    }
+    return "none";
+  };
+  EXPECT_EQ(which([] { throw CBlockException::General("A"); }), "block");
+  EXPECT_EQ(which([] { throw CBFileException::General("A"); }), "exception");
+  EXPECT_EQ(which([] { throw CShareDatabaseWarning::Text("No data", "Fetch", nullptr); }),
+            "exception");
+  test::ConfiguredHome home;
+  EXPECT_EQ(which([] { throw CMFileUnknownException::Unknown("A"); }), "unknown");
+}
+
+TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {
+  test::ConfiguredHome home;
+  using G = CPiCmdException;
+  using GU = CPiCmdUnknownException;
+  EXPECT_EQ((Guard<G, GU>("ExecuteW", [] { return 42; })), 42);
+  EXPECT_EQ(ThrownTexts<G>([] {
+              Guard<G, GU>("ExecuteW", [] { throw G::Text("Own", "TranslateW", nullptr); });
+            }),
+            Texts{"Own (Module:PiCmd,Method:TranslateW)"});
+  EXPECT_EQ(ThrownTexts<G>([] {
+              Guard<G, GU>("ExecuteW", [] { throw CBlockException::Text("Cause", "Read", nullptr); });
+            }),
+            (Texts{"General Error (Module:PiCmd,Method:ExecuteW)", "Cause (Module:Block,Method:Read)"}));
+  // Anything else, an unknown exception from below included, becomes this
+  // module's unknown exception with no inner entries.
+  EXPECT_EQ(ThrownTexts<GU>([] {
+              Guard<G, GU>("ExecuteW", [] { throw std::runtime_error("boom"); });
+            }),
+            Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
+  EXPECT_EQ(ThrownTexts<GU>([] {
+              Guard<G, GU>("ExecuteW", [] { throw CMFileUnknownException::Unknown("Read"); });
+            }),
+            Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
+  EXPECT_NE(test::TraceOf(home, "PILIB").find(
+                " PiCmdUnknownException - *** UNKNOWN EXCEPTION *** (Method:ExecuteW)\r\n"),
+            std::string::npos);
+}
+
+TEST(Guard, ModulesWithoutUnknownClassPassForeignExceptions) {
+  test::ConfiguredHome home;
+  EXPECT_THROW((Guard<CBlockException>("Read", [] { throw std::runtime_error("x"); })),
+               std::runtime_error);
+  EXPECT_EQ(ThrownTexts<CMFileUnknownException>([] {
+              Guard<CBlockException>("Read", [] { throw CMFileUnknownException::Unknown("Get"); });
+            }),
+            Texts{kUnknown + " (Module:MFile,Method:Get)"});
+}
+
+TEST(Guard, AnErrorCollectsOneGeneralEntryPerBoundary) {
+  const auto texts = ThrownTexts<CPiStartPointException>([] {
+    Guard<CPiStartPointException, CPiStartPointUnknownException>("ExecuteW", [] {
+      Guard<CPiFIndexException, CPiFIndexUnknownException>("BuildRowFindex", [] {
+        Guard<CBlockException>("InsertRow", [] {
+          throw CWinFileException::Text("Error writing file: %S", "Write", nullptr, "a.fst");
+        });
+      });
+    });
+  });
+  EXPECT_EQ(texts, (Texts{"General Error (Module:PiStartPoint,Method:ExecuteW)",
+                          "General Error (Module:PiFIndex,Method:BuildRowFindex)",
+                          "General Error (Module:Block,Method:InsertRow)",
+                          "Error writing file: a.fst (Module:WinFile,Method:Write)"}));
+}
+
+}  // namespace
+}  // namespace qm

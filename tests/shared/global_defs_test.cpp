@@ -1,0 +1,189 @@
+// The settings object: folders and placeholders, configuration values, the
+// connection and its display name, dbc.dat and the connection-text scramble.
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+
+#include "file_test_util.h"
+#include "shared/exception_family.h"
+#include "shared/global_defs.h"
+#include "shared/registry_key.h"
+#include "shared/sql_time.h"
+#include "shared/trace.h"
+#include "support/test_support.h"
+
+namespace qm {
+namespace {
+
+using test::RaisedText;
+
+std::string Stdfun(const std::string& text, const std::string& method) {
+  return text + " (Module:STDFUN,Method:" + method + ")";
+}
+
+class GlobalDefsTest : public ::testing::Test {
+ protected:
+  test::ConfiguredHome home_;  // restores the variables the tests change
+};
+
+TEST_F(GlobalDefsTest, FolderKinds) {
+  CGlobalDefs defs;
+  const std::string h = home_.Home(), d = home_.Data(), g = d + "Groups/PUBLIC/";
+  const std::pair<int, std::string> kinds[] = {
+      {8, h},  {14, h + "Config/"}, {10, h + "System/"}, {11, h + "Log/"}, {15, h + "Tasks/"},
+      {0, d},  {17, d + "Language/"}, {5, d + "Converters/"}, {18, d + "Groups/"}, {7, g},
+      {12, g + "Indexes/"}, {13, g + "Orders/"}, {9, g + "Config/"}, {1, g + "Repositories/"},
+      {16, g + "Repositories/"}, {2, g + "Definitions/"}, {4, g + "Queries/"},
+      {3, g + "WorkData/"}, {6, g + "DataStore/"}};
+  for (const auto& [kind, path] : kinds) EXPECT_EQ(defs.GetFolder(FolderKind(kind)), path) << kind;
+  EXPECT_EQ(RaisedText<CSTDFUNException>([&] { defs.GetFolder(FolderKind(19)); }),
+            Stdfun("Unknown folder kind: 19", "GetFolder"));
+  EXPECT_EQ(RaisedText<CSTDFUNException>([&] { defs.GetHomePath(FolderKind::Indexes); }),
+            Stdfun("Unknown folder kind: 12", "GetHomePath"));
+  EXPECT_EQ(RaisedText<CSTDFUNException>([&] { defs.GetFullDataPath(FolderKind::Log); }),
+            Stdfun("Unknown folder kind: 11", "GetFullDataPath"));
+
+  setenv("MORVIL_PATH", "/srv/D", 1);  // no trailing slash
+  EXPECT_EQ(defs.GetFolder(FolderKind::Indexes), "/srv/D/Groups/PUBLIC/Indexes/");
+  EXPECT_EQ(defs.GetFolder(FolderKind::GroupConfig, true),
+            "[QUILLMERE_HOME]\\Data/Groups/PUBLIC/Config/");
+  EXPECT_EQ(defs.GetFolder(FolderKind::HomeConfig, true), "[QUILLMERE_HOME]\\Config/");
+  defs.SetDataPath("/caller/data");  // wins over the configured path and the placeholder
+  EXPECT_EQ(defs.GetFolder(FolderKind::Data, true), "/caller/data/");
+  defs.SetGroup("grüne Bücher");
+  EXPECT_EQ(defs.GetFolder(FolderKind::Orders), "/caller/data/Groups/GRÜNE BÜCHER/Orders/");
+  for (const char* bad : {"", ".", "..", "../etc", "a/b"}) {
+    defs.SetGroup(bad);
+    EXPECT_EQ(RaisedText<CSTDFUNException>([&] { defs.GetFolder(FolderKind::Group); }),
+              Stdfun("Invalid group name: " + std::string(bad), "GetFullDataPath"));
+  }
+}
+
+TEST_F(GlobalDefsTest, MissingRootsAreReportedOrLeftEmpty) {
+  unsetenv("MORVIL_PATH");
+  unsetenv("MORVIL_HOME");
+  CGlobalDefs defs;
+  EXPECT_EQ(RaisedText<CSTDFUNException>([&] { defs.GetFolder(FolderKind::WorkData); }),
+            Stdfun("Data path is not set", "GetFullDataPath"));
+  EXPECT_EQ(defs.GetFolder(FolderKind::HomeConfig), "");
+  EXPECT_EQ(RaisedText<CSTDFUNException>(
+                [&] { defs.GetHomePathRequired(FolderKind::HomeConfig, "SLGetTempConfigFilePath"); }),
+            Stdfun("Home path is not set", "SLGetTempConfigFilePath"));
+  EXPECT_EQ(defs.ExpandPlaceholders("plain text"), "plain text");  // needs no root
+  EXPECT_EQ(RaisedText<CSTDFUNException>([] { GetRegKey("home"); }),
+            Stdfun("Morvil registry key does not exists", "getregkey"));
+}
+
+TEST_F(GlobalDefsTest, PlaceholdersExpandAndTheDataRootCollapsesKeepingCase) {
+  CGlobalDefs defs;
+  defs.SetDataPath(home_.Data() + "Mixed/Root");
+  const std::string h = home_.Home(), d = home_.Data() + "Mixed/Root/";
+  const std::string text =
+      "[QUILLMERE_HOME]\\a;[QUILLMERE_CONFIG]\\b;[QUILLMERE_DATA]\\c;[QUILLMERE_DATA_GROUP]\\d;"
+      "[QUILLMERE_DATA_CONVERTERS]\\e;[QUILLMERE_DATA_STORE]\\f;[quillmere_data]\\g";
+  EXPECT_EQ(defs.ExpandPlaceholders(text),
+            h + "a;" + h + "Config/b;" + d + "c;" + d + "Groups/d;" + d + "Converters/e;" + d +
+                "Groups/PUBLIC/DataStore/f;[quillmere_data]\\g");
+  EXPECT_EQ(defs.ExpandHomePlaceholders(text),
+            h + "a;" + h + "Config/b" + text.substr(text.find(";[QUILLMERE_DATA]")));
+
+  const std::string stored = d + "Groups/PUBLIC/Repositories/Doc.HTML|" + d + "x|" +
+                             home_.Data() + "MIXED/ROOT/y";  // another spelling is another folder
+  const std::string collapsed = defs.CollapseDataPath(stored);
+  EXPECT_EQ(collapsed, "[QUILLMERE_DATA]\\Groups/PUBLIC/Repositories/Doc.HTML|[QUILLMERE_DATA]\\x|" +
+                           home_.Data() + "MIXED/ROOT/y");
+  EXPECT_EQ(defs.ExpandPlaceholders(collapsed), stored);
+}
+
+TEST_F(GlobalDefsTest, ConfigurationValues) {
+  EXPECT_EQ(GetRegKey("home"), home_.Home());
+  EXPECT_EQ(RaisedText<CSTDFUNException>([] { GetRegKey("client_piport"); }),
+            Stdfun("Morvil registry key client_piport does not exists", "getregkey"));
+  test::WriteFile(home_.Home() + "registry.conf", "client_piport = 4100\n");
+  setenv("MORVIL_REGISTRY", (home_.Home() + "registry.conf").c_str(), 1);
+  EXPECT_EQ(GetRegKey("client_piport"), "4100");
+}
+
+TEST_F(GlobalDefsTest, DsnConnectionIsTracedWithoutItsPassword) {
+  test::WriteFile(home_.Home() + "Log/traceStat.log", "Trace Level 1\n");
+  CGlobalDefs defs;
+  std::filesystem::remove(home_.Home() + "Log/traceStat.log");
+  InitTraceLevels();  // the process-wide flags back to off for the other tests
+  EXPECT_TRUE(defs.TraceLevel1());
+  EXPECT_FALSE(defs.IsConnectionSet());
+  defs.SetConnectionDsn("Books", "reader", "s3cret");
+  EXPECT_TRUE(defs.IsConnectionSet());
+  EXPECT_EQ(defs.GetConnectionMode(), ConnectionMode::Dsn);
+  EXPECT_EQ(defs.GetConnectionString(), "DSN=Books;UID=reader;PWD=s3cret;");
+  EXPECT_EQ(defs.GetDisplayName(), "Books");
+  int files = 0;  // PILIB and FILIB
+  for (const auto& entry : std::filesystem::directory_iterator(home_.Home() + "Log")) {
+    const std::string log = test::ReadFile(entry.path().string());
+    EXPECT_TRUE(log.ends_with(" (SHARELIB)CGlobalDefs.set_connection - Connection set: DSN; Books\r\n"));
+    EXPECT_EQ(log.find("s3cret"), std::string::npos);
+    ++files;
+  }
+  EXPECT_EQ(files, 2);
+}
+
+TEST_F(GlobalDefsTest, ConnectionStringsAndTheirDisplayNames) {
+  CGlobalDefs defs;
+  defs.SetConnection("default", "Local store");
+  EXPECT_EQ(defs.GetConnectionString(), "Driver=SQLite3;Database=" + home_.Data() +
+                                            "Groups/PUBLIC/DataStore/Default.db;StepAPI=1;");
+  EXPECT_EQ(defs.GetDisplayName(), "Local store");
+  defs.SetConnectionString("", "ignored");  // an empty text changes nothing
+  EXPECT_EQ(defs.GetDisplayName(), "Local store");
+  const std::pair<std::string, std::string> names[] = {
+      {"dsn=books;uid=x;pwd=y", "BOOKS"},
+      {"Driver=PostgreSQL;Server=h;db=Sales;", "SALES"},
+      {"Driver=SQLite3;Database=/d/Default.db;", "No Display Name"}};
+  for (const auto& [text, name] : names) {
+    defs.SetConnection(text, "");
+    EXPECT_EQ(defs.GetConnectionString(), text);
+    EXPECT_EQ(defs.GetDisplayName(), name) << text;
+  }
+  CGlobalDefs copy(defs);
+  defs.SetConnectionDsn("Other", "", "");
+  EXPECT_EQ(copy.GetConnectionString(), "Driver=SQLite3;Database=/d/Default.db;");
+}
+
+TEST_F(GlobalDefsTest, GroupConnectionComesFromAScrambledDbcDat) {
+  CGlobalDefs defs;
+  defs.SetGroup("sales");
+  defs.SetConnection("DSN=Before;", "before");
+  defs.SetConnection("SQL_GROUP_DEFAULT", "unused");  // no dbc.dat: nothing changes
+  EXPECT_EQ(defs.GetConnectionString(), "DSN=Before;");
+  const std::string plain = "DSN=Orders;UID=clerk;PWD=p\tw d;";
+  std::string stored = plain;
+  ScrambleConnectionText(stored);
+  EXPECT_NE(stored, plain);
+  test::WriteFile(home_.Data() + "Groups/SALES/Config/dbc.dat", stored + std::string(1, '\0'));
+  defs.SetConnection("sql_group_default", "unused");
+  EXPECT_EQ(defs.GetConnectionString(), plain);
+  EXPECT_EQ(defs.GetDisplayName(), "sales");
+}
+
+TEST(ConnectionScrambleTest, TheSubstitutionIsItsOwnInverse) {
+  for (int b = 0; b < 256; ++b) {
+    EXPECT_EQ(ScrambleConnectionByte(ScrambleConnectionByte(static_cast<uint8_t>(b))), b) << b;
+  }
+  const std::pair<int, int> pairs[] = {{9, 2},     {10, 3},    {13, 4},    {32, 1},
+                                       {34, 84},   {83, 133},  {134, 184}, {183, 233},
+                                       {0, 0},     {33, 33},   {234, 234}, {255, 255}};
+  for (const auto& [from, to] : pairs) {
+    EXPECT_EQ(ScrambleConnectionByte(static_cast<uint8_t>(from)), to) << from;
+  }
+}
+
+TEST(SqlTimeTest, LocalTimeBecomesADateAndDatesPrintWithoutLeadingZeros) {
+  const DateTimeValue date = SystemTimeToSQLTime({2004, 3, 9, 14, 5, 7});
+  EXPECT_EQ(date, (DateTimeValue{2004, 3, 9, 14, 5, 7, 0}));
+  EXPECT_EQ(SQLTimeToString(date), "2004-3-9 14:5:7");
+  EXPECT_EQ(SQLTimeToString({1999, 12, 31, 0, 0, 9, 250}, true), "1999-12-31 0:0:9.250");
+}
+
+}  // namespace
+}  // namespace qm

@@ -1,0 +1,178 @@
+// Random and malformed input for the parsers of the core: they must never
+// crash or loop, and fail only with exceptions of the family.
+#include <gtest/gtest.h>
+
+#include <random>
+#include <string>
+#include <string_view>
+
+#include "platform/text_encoding.h"
+#include "shared/error_messages.h"
+#include "shared/exception_family.h"
+#include "shared/message_format.h"
+#include "shared/tokenizer.h"
+#include "shared/value.h"
+
+namespace qm {
+namespace {
+
+constexpr int kRounds = 3000;
+
+class Random {
+ public:
+  explicit Random(unsigned seed) : engine_(seed) {}
+  std::size_t Below(std::size_t n) { return std::uniform_int_distribution<std::size_t>(0, n - 1)(engine_); }
+  bool OneIn(std::size_t n) { return Below(n) == 0; }
+  // Text drawn from an alphabet, with an occasional arbitrary byte.
+  std::string Text(std::string_view alphabet, std::size_t max_length) {
+    std::string s(Below(max_length + 1), ' ');
+    for (auto& c : s) c = OneIn(16) ? static_cast<char>(Below(256)) : alphabet[Below(alphabet.size())];
+    return s;
+  }
+  std::string Number(int max) { return std::to_string(Below(static_cast<std::size_t>(max) + 1)); }
+
+ private:
+  std::mt19937 engine_;
+};
+
+bool IsValidUtf8(const std::string& s) { return Utf16ToUtf8(Utf8ToUtf16(s)) == s; }
+
+TEST(MalformedInput, TokenizersAlwaysProgress) {
+  Random rnd(1);
+  const std::string_view alphabet = "ab ,;\"#\t\xC3\xA9";
+  for (int round = 0; round < kRounds; ++round) {
+    const std::string original = rnd.Text(alphabet, 40);
+    const char delimiter = alphabet[rnd.Below(alphabet.size())];
+    std::string source = original;
+    std::string token;
+    std::size_t calls = 0;
+    while (GetToken(source, token, delimiter, rnd.OneIn(2))) {
+      ASSERT_LT(source.size(), original.size());
+      ASSERT_LE(++calls, original.size());
+    }
+    EXPECT_TRUE(token.empty());
+
+    std::string by_set = original;
+    const std::string set = rnd.Text(" ,;\"", 3);
+    for (std::size_t guard = 0;; ++guard) {
+      ASSERT_LE(guard, original.size() + 1);
+      const std::size_t before = by_set.size();
+      const int delim = GetTokenBySet(by_set, token, set);
+      EXPECT_EQ(token.find_first_of(set), std::string::npos);
+      if (delim == -1) {
+        EXPECT_TRUE(by_set.empty());
+        break;
+      }
+      EXPECT_NE(set.find(static_cast<char>(delim)), std::string::npos);
+      ASSERT_LT(by_set.size(), before);
+    }
+
+    std::string quoted = original;
+    TrimQuotes(quoted);
+    EXPECT_TRUE(quoted.empty() || (quoted.front() != '"' && quoted.back() != '"')) << original;
+    RemoveQuotes(quoted);
+    EXPECT_EQ(quoted.find('"'), std::string::npos);
+  }
+}
+
+TEST(MalformedInput, DateTextEitherParsesInRangeOrRaisesValueError) {
+  Random rnd(3);
+  for (int round = 0; round < kRounds; ++round) {
+    const std::string text = rnd.Text("0123456789/-: .APMapmx", 24);
+    const bool upper = rnd.OneIn(2);
+    CValue v;
+    try {
+      v.SetDateFromText(text, upper);
+    } catch (const CValueException& e) {
+      EXPECT_EQ(Utf16ToUtf8(e.GetEntries().at(0).text).rfind("Invalid date or time: ", 0), 0u);
+      continue;
+    }
+    const DateTimeValue& d = v.GetDateTime();
+    EXPECT_EQ(v.GetType(), VALUE_TYPE::DateTime);
+    EXPECT_LE(d.month, 12) << text;
+    EXPECT_LE(d.day, 31) << text;
+    EXPECT_TRUE(d.hour <= 23 || (upper && d.hour == 25)) << text;
+    EXPECT_TRUE(d.minute <= 59 || (upper && d.minute == 61)) << text;
+    EXPECT_TRUE(d.second <= 59 || (upper && d.second == 61)) << text;
+  }
+}
+
+TEST(MalformedInput, WellFormedDatesMatchAnIndependentReading) {
+  Random rnd(4);
+  for (int round = 0; round < kRounds; ++round) {
+    const int month = 1 + static_cast<int>(rnd.Below(12));
+    const int day = 1 + static_cast<int>(rnd.Below(31));
+    const int year = static_cast<int>(rnd.Below(100));
+    const int hour12 = 1 + static_cast<int>(rnd.Below(12));
+    const int minute = static_cast<int>(rnd.Below(60));
+    const bool pm = rnd.OneIn(2);
+    const std::string text = std::to_string(month) + "/" + std::to_string(day) + "/" +
+                             (year < 10 ? "0" : "") + std::to_string(year) + " " +
+                             std::to_string(hour12) + ":" + std::to_string(minute) +
+                             (rnd.OneIn(2) ? " " : "") + (pm ? "pm" : "AM");
+    CValue v;
+    v.SetDateFromText(text, false);
+    const DateTimeValue& d = v.GetDateTime();
+    EXPECT_EQ(d.year, year <= 50 ? 2000 + year : 1900 + year) << text;
+    EXPECT_EQ(d.month, month) << text;
+    EXPECT_EQ(d.day, day) << text;
+    EXPECT_EQ(d.hour, hour12 % 12 + (pm ? 12 : 0)) << text;
+    EXPECT_EQ(d.minute, minute) << text;
+    EXPECT_EQ(d.second, 0) << text;
+  }
+}
+
+TEST(MalformedInput, FormatterStaysWithinItsLimitsWhateverTheFormat) {
+  Random rnd(5);
+  const std::string_view alphabet = "%%sSidx ab\xC3\xA9";
+  for (int round = 0; round < kRounds; ++round) {
+    std::string format = rnd.Text(alphabet, 30);
+    if (!IsValidUtf8(format)) format = Utf16ToUtf8(Utf8ToUtf16(format));
+    const std::string arg = Utf16ToUtf8(Utf8ToUtf16(rnd.Text(alphabet, 20)));
+    const std::size_t narrow_limit = rnd.Below(40);
+    const std::string narrow = FormatNarrow(format, narrow_limit, arg, -12, Utf8ToUtf16(arg));
+    EXPECT_LE(narrow.size(), narrow_limit);
+    EXPECT_TRUE(IsValidUtf8(narrow)) << format;
+    if (format.find('%') == std::string::npos) {
+      EXPECT_EQ(narrow, format.substr(0, Utf8CutLength(format, narrow_limit)));
+    }
+    const std::size_t wide_limit = rnd.Below(40);
+    const std::u16string wide =
+        FormatWide(Utf8ToUtf16(format), wide_limit, Utf8ToUtf16(arg + "\xF0\x9F\x98\x80"), arg);
+    EXPECT_LE(wide.size(), wide_limit);
+    EXPECT_FALSE(!wide.empty() && wide.back() >= 0xD800 && wide.back() <= 0xDBFF) << format;
+  }
+}
+
+TEST(MalformedInput, ErrorMessageFilesOnlyYieldWellFormedEntries) {
+  Random rnd(6);
+  const char16_t* pieces[] = {u"[ERROR MESSAGES]", u"[END]", u",", u",", u"\r\n", u"\n", u"\r",
+                              u"0",  u"7", u"-1", u"99999999999", u"text", u" ", u"\xD800",
+                              u"\U0001F600"};
+  for (int round = 0; round < kRounds; ++round) {
+    std::string bytes;
+    if (rnd.OneIn(4)) {
+      bytes = rnd.Text("\xFF\xFE,0\r\n[]", 200);
+    } else {
+      std::u16string text = rnd.OneIn(2) ? u"[ERROR MESSAGES]\r\n" : u"";
+      for (std::size_t i = rnd.Below(60); i > 0; --i) text += pieces[rnd.Below(std::size(pieces))];
+      bytes = "\xFF\xFE";
+      for (char16_t c : text) {
+        bytes.push_back(static_cast<char>(c & 0xFF));
+        bytes.push_back(static_cast<char>(c >> 8));
+      }
+      if (rnd.OneIn(5)) bytes.pop_back();
+    }
+    for (const auto& [number, entry] : ParseErrorMessages(bytes)) {
+      EXPECT_EQ(entry.number, number);
+      EXPECT_NE(entry.number, 0);
+      EXPECT_NE(entry.level, 0);
+      EXPECT_FALSE(entry.text.empty());
+      EXPECT_LE(entry.text.size(), 2047u);
+      EXPECT_EQ(entry.text.find_first_of(u"\r\n"), std::u16string::npos);
+    }
+  }
+}
+
+}  // namespace
+}  // namespace qm

@@ -1,0 +1,426 @@
+// The language object: loading and its failures, the order of the steps, stop
+// words, character translations, accent removal and the phonetic codes.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "platform/text_encoding.h"
+#include "text/character_table.h"
+#include "text/double_metaphone.h"
+#include "text/language.h"
+#include "text/language_test_support.h"
+
+namespace qm::test {
+namespace {
+
+bool Contains(const std::string& text, const std::string& part) {
+  return text.find(part) != std::string::npos;
+}
+
+std::string N(CLanguage& language, const std::u16string& word) {
+  return Utf16ToUtf8(language.Normalise(std::u16string_view(word)));
+}
+
+TEST(Language, EveryShippedLanguageLoadsWithItsSteps) {
+  CLanguage language(ShippedLanguageFolder());
+  for (int32_t id = lngDanish; id <= lngRussian; ++id) {
+    SCOPED_TRACE(id);
+    language.LoadLanguage(id, true, true, true, true, true);
+    EXPECT_TRUE(language.IsLoaded());
+    EXPECT_EQ(language.GetLanguage(), id);
+    EXPECT_EQ(language.GetOptions(), 31);
+    EXPECT_FALSE(language.Normalise(std::u16string_view(u"INFORMATION")).empty());
+  }
+  language.LoadLanguage(lngOther, true, false, false, false, true);
+  EXPECT_TRUE(language.IsLoaded());
+  EXPECT_EQ(language.GetOptions(), CLanguage::kUseStopWords | CLanguage::kUseCharacterTranslation);
+}
+
+TEST(Language, ShippedStopWordsAreUpperCasedOnLoad) {
+  CLanguage language(ShippedLanguageFolder());
+  language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords);
+  EXPECT_TRUE(language.IsStopWord(u"THE"));
+  EXPECT_FALSE(language.IsStopWord(u"the"));
+  EXPECT_FALSE(language.IsStopWord(u"RIVER"));
+  language.LoadLanguage(lngRussian, CLanguage::kUseStopWords);
+  EXPECT_TRUE(language.IsStopWord(u"И"));
+  EXPECT_TRUE(language.IsStopWord(u"ЧТОБЫ"));
+  language.LoadLanguage(lngRussian, 0);
+  EXPECT_FALSE(language.IsStopWord(u"И"));  // stop words off
+}
+
+TEST(Language, UnknownLanguagesAreRefused) {
+  CLanguage language(ShippedLanguageFolder());
+  language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords);
+  for (const int32_t id : {0, 13, -1}) {
+    const std::string text = FailureText([&] { language.LoadLanguage(id, 0); });
+    EXPECT_TRUE(Contains(text, "Unknown language " + std::to_string(id) +
+                                   " (Module:Language,Method:LoadLanguage)"))
+        << text;
+    EXPECT_FALSE(language.IsLoaded());
+    EXPECT_FALSE(language.IsStopWord(u"THE"));
+  }
+}
+
+TEST(Language, OtherLanguageRefusesStemmingPhoneticAndAccents) {
+  CLanguage language(ShippedLanguageFolder());
+  EXPECT_TRUE(Contains(
+      FailureText([&] { language.LoadLanguage(lngOther, false, true, false, false, false); }),
+      "Stemming is only supported for specific languages, not for other languages "
+      "(Module:Language,Method:InitializeStemming)"));
+  EXPECT_TRUE(Contains(
+      FailureText([&] { language.LoadLanguage(lngOther, false, false, true, false, false); }),
+      "Phonetic search is only supported for specific languages, not for other languages "
+      "(Module:Language,Method:InitializePhonetic)"));
+  EXPECT_TRUE(Contains(
+      FailureText([&] { language.LoadLanguage(lngOther, false, false, false, true, false); }),
+      "Accents can only be removed for specific languages, not for other languages. Use "
+      "custom character translation instead. (Module:Language,Method:LoadLanguage)"));
+  EXPECT_FALSE(language.IsLoaded());
+}
+
+TEST(Language, ConfigurationIsRememberedOnlyAfterACompleteLoad) {
+  LanguageFolder folder;
+  folder.WriteMinimal("Other");
+  folder.WriteUtf16("Other", "lang.txt", u"A - B\n");
+  CLanguage language(folder.Path());
+  language.LoadLanguage(lngOther, false, false, false, false, true);
+  EXPECT_EQ(N(language, u"CAT"), "CBT");
+
+  // Same configuration: nothing is read again, so a broken file goes unnoticed.
+  folder.WriteUtf16("Other", "lang.txt", u"A\n");
+  language.LoadLanguage(lngOther, false, false, false, false, true);
+  EXPECT_EQ(N(language, u"CAT"), "CBT");
+
+  // Dropping translation and taking it back reads the file and fails.
+  language.LoadLanguage(lngOther, false, false, false, false, false);
+  EXPECT_EQ(N(language, u"CAT"), "CAT");
+  EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(lngOther, 8); }),
+                       "Error parsing file (Module:Language,Method:LoadCharacterTranslations)"));
+  EXPECT_FALSE(language.IsLoaded());
+  EXPECT_EQ(N(language, u"CAT"), "CAT");
+
+  // The failed configuration was not remembered: the same call loads again.
+  folder.WriteUtf16("Other", "lang.txt", u"A - E\n");
+  language.LoadLanguage(lngOther, 8);
+  EXPECT_EQ(N(language, u"CAT"), "CET");
+}
+
+TEST(Language, MissingFilesAreReportedByTheFileLayer) {
+  LanguageFolder folder;
+  CLanguage language(folder.Path());
+  std::string text = FailureText([&] { language.LoadLanguage(lngDutch, 0); });
+  EXPECT_TRUE(Contains(text, "Dutch/info.txt (Module:WinFile,Method:OpenWinFile)")) << text;
+  EXPECT_TRUE(Contains(text, "(Module:Language,Method:LoadLanguage)")) << text;
+
+  folder.Write("Dutch", "info.txt", "missing.tbl 1\n");
+  text = FailureText([&] { language.LoadLanguage(lngDutch, 0); });
+  EXPECT_TRUE(Contains(text, "General/missing.tbl (Module:WinFile,Method:OpenWinFile)")) << text;
+  EXPECT_FALSE(language.IsLoaded());
+}
+
+TEST(Language, MalformedInfoFilesAndCharacterTablesAreParseErrors) {
+  LanguageFolder folder;
+  folder.WriteMinimal("Dutch");
+  CLanguage language(folder.Path());
+  const auto expect_parse_error = [&](const std::string& what) {
+    const std::string text = FailureText([&] { language.LoadLanguage(lngDutch, 0); });
+    EXPECT_TRUE(Contains(text, "Error parsing file (Module:Language,Method:LoadLanguage)"))
+        << what << ": " << text;
+  };
+  for (const char* info : {"", "latin1.tbl", "latin1.tbl one", "latin1.tbl 1x"}) {
+    folder.Write("Dutch", "info.txt", info);
+    expect_parse_error(std::string("info.txt '") + info + "'");
+  }
+  folder.Write("Dutch", "info.txt", "bad.tbl 1");
+  const std::string good = ReadFile(ShippedLanguageFolder() + "General/latin1.tbl");
+  std::string row255 = good.substr(0, good.rfind('\n', good.size() - 2) + 1);
+  const std::vector<std::pair<std::string, std::string>> tables = {
+      {"empty", ""},
+      {"255 rows", row255},
+      {"257 rows", good + "1 2 3 4 5 6 7 8\n"},
+      {"a number above 255", good.substr(0, good.size() - 4) + "256\n"},
+      {"a negative number", "-1" + good.substr(good.find(' '))},
+      {"a word", "x" + good.substr(good.find(' '))},
+      {"seven numbers in a row", good.substr(0, good.size() - 5) + "\n"},
+  };
+  for (const auto& [what, bytes] : tables) {
+    folder.Write("General", "bad.tbl", bytes);
+    expect_parse_error(what);
+  }
+}
+
+// Exactly 2,048 decimal numbers from 0 to 255, split as the table reader splits.
+bool IsWellFormedTable(const std::string& bytes) {
+  std::size_t count = 0;
+  std::size_t i = 0;
+  while (i < bytes.size()) {
+    while (i < bytes.size() && std::string(" \n\r\f\t").find(bytes[i]) != std::string::npos) ++i;
+    if (i == bytes.size()) break;
+    std::string token;
+    while (i < bytes.size() && std::string(" \n\r\f\t").find(bytes[i]) == std::string::npos) {
+      token += bytes[i++];
+    }
+    if (token.find_first_not_of("0123456789") != std::string::npos || std::stoul(token.substr(0, 9)) > 255) {
+      return false;
+    }
+    ++count;
+  }
+  return count == 2048;
+}
+
+TEST(Language, TruncatedAndRandomCharacterTablesNeverLoadHalfway) {
+  const std::string good = ReadFile(ShippedLanguageFolder() + "General/latin1.tbl");
+  std::mt19937 random(7);
+  std::vector<std::string> inputs;
+  for (int n = 0; n < 200; ++n) inputs.push_back(good.substr(0, random() % good.size()));
+  for (std::size_t cut = good.size() - 12; cut <= good.size(); ++cut) inputs.push_back(good.substr(0, cut));
+  for (int n = 0; n < 200; ++n) {
+    std::string bytes = good;
+    for (int k = 0; k < 3; ++k) bytes[random() % bytes.size()] = static_cast<char>(random() % 256);
+    inputs.push_back(bytes);
+  }
+  for (int n = 0; n < 100; ++n) {
+    std::string bytes(random() % 9000, ' ');
+    for (char& c : bytes) c = "0123456789 \n"[random() % 12];
+    inputs.push_back(bytes);
+  }
+  int loaded = 0;
+  for (const auto& bytes : inputs) {
+    text::CharacterTable table;
+    const bool ok = text::CharacterTable::Parse(bytes, table);
+    EXPECT_EQ(ok, IsWellFormedTable(bytes));
+    loaded += ok;
+  }
+  EXPECT_GT(loaded, 0);  // the whole table and cuts inside its last blank or number
+}
+
+TEST(Language, RandomAndTruncatedLanguageFilesLoadOrGiveParseErrors) {
+  LanguageFolder folder;
+  folder.WriteMinimal("German", 2);
+  const std::string real_rules = ReadFile(ShippedLanguageFolder() + "German/1.dat");
+  const std::string real_stops = ReadFile(ShippedLanguageFolder() + "German/stop.txt");
+  std::mt19937 random(11);
+  int loads = 0;
+  int failures = 0;
+  const auto random_bytes = [&](std::size_t n) {
+    std::string s(n, '\0');
+    for (char& c : s) c = static_cast<char>(random() % 256);
+    return s;
+  };
+  for (int n = 0; n < 150; ++n) {
+    const std::string junk = random_bytes(random() % 600);
+    folder.Write("German", "1.dat", n % 2 ? junk : real_rules.substr(0, random() % real_rules.size()) + junk.substr(0, 20));
+    folder.Write("German", "stop.txt", n % 3 ? junk : real_stops.substr(0, random() % real_stops.size()));
+    folder.Write("German", "lang.txt", n % 5 ? Utf16LeFile(u"A - B\n") : junk);
+    CLanguage language(folder.Path());
+    const std::string text = FailureText([&] {
+      language.LoadLanguage(lngGerman, n % 2 ? 31 : 30);
+    });
+    if (!text.empty()) {
+      EXPECT_TRUE(Contains(text, "Error parsing file")) << text;
+      ++failures;
+      continue;
+    }
+    ++loads;
+    for (const char16_t* word : {u"SCHMIDT", u"A", u"", u"ÄÖÜ", u"ЖУК", u"XX-YY"}) {
+      const std::u16string code = language.Normalise(std::u16string_view(word));
+      EXPECT_LE(code.size(), std::u16string_view(word).size() * 3 + 8);
+    }
+  }
+  EXPECT_GT(loads, 10);
+  EXPECT_GT(failures, 10);
+}
+
+// --- character translation ---
+
+class Translation : public ::testing::Test {
+ protected:
+  std::string Translate(const std::u16string& lines, const std::u16string& word) {
+    folder_.WriteUtf16("Other", "lang.txt", lines);
+    CLanguage language(folder_.Path());
+    language.LoadLanguage(lngOther, CLanguage::kUseCharacterTranslation);
+    return N(language, word);
+  }
+  void SetUp() override { folder_.WriteMinimal("Other"); }
+  LanguageFolder folder_;
+};
+
+TEST_F(Translation, EqualsAddsTheReversePairAfterTheForwardOne) {
+  EXPECT_EQ(Translate(u"AE = Ä\n", u"MÄRCHEN"), "MAERCHEN");
+  EXPECT_EQ(Translate(u"AE = Ä\n", u"MAERCHEN"), "MAERCHEN");
+  EXPECT_EQ(Translate(u"AE - Ä\n", u"MÄRCHEN"), "MÄRCHEN");
+  EXPECT_EQ(Translate(u"AE - Ä\n", u"MAERCHEN"), "MÄRCHEN");
+  // From texts are compared as written, against upper-case words.
+  EXPECT_EQ(Translate(u"ae - x\n", u"MAERCHEN"), "MAERCHEN");
+}
+
+TEST_F(Translation, TwoTokenLinesRepeatThePreviousOperator) {
+  const std::u16string lines = u"\r\nX - Y\r\n\r\nP Q\r\nA = B\n  \nC D\n";
+  EXPECT_EQ(Translate(lines, u"PCD"), "QCC");  // (C,D) then (D,C)
+  EXPECT_EQ(Translate(lines, u"XA"), "YA");     // (X,Y), (A,B), (B,A)
+}
+
+TEST_F(Translation, HashDeletesAndNeverBecomesAFromText) {
+  EXPECT_EQ(Translate(u"H - #\n", u"THOMAS"), "TOMAS");
+  EXPECT_EQ(Translate(u"Z = #\n", u"ZOO"), "OO");
+  EXPECT_EQ(Translate(u"Z = #\n", u"ABC"), "ABC");
+}
+
+TEST_F(Translation, AResultThatWouldReach200CharactersIsSkipped) {
+  const std::u16string lines = u"A - AA\nB - C\n";
+  EXPECT_EQ(Translate(lines, std::u16string(99, u'A')), std::string(198, 'A'));
+  EXPECT_EQ(Translate(lines, std::u16string(100, u'A')), std::string(100, 'A'));
+  // One replacement would fit, all of them would not.
+  EXPECT_EQ(Translate(lines, std::u16string(120, u'A') + u"B"), std::string(120, 'A') + "C");
+}
+
+TEST_F(Translation, MalformedLinesAreParseErrors) {
+  const std::vector<std::u16string> files = {u"A\n", u"A B\n", u"A -\n", u"A - B C\n",
+                                             u"A B C\n", u"A - B\nC\n"};
+  for (const auto& lines : files) {
+    folder_.WriteUtf16("Other", "lang.txt", lines);
+    CLanguage language(folder_.Path());
+    const std::string text = FailureText([&] { language.LoadLanguage(lngOther, 8); });
+    EXPECT_TRUE(Contains(text, "Error parsing file (Module:Language,Method:LoadCharacterTranslations)"))
+        << Utf16ToUtf8(lines) << ": " << text;
+  }
+  folder_.Write("Other", "lang.txt", Utf16LeFile(u"A - B\n") + "x");  // odd byte count
+  CLanguage language(folder_.Path());
+  EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(lngOther, 8); }),
+                       "Error parsing file"));
+}
+
+// --- stop words ---
+
+TEST(StopWords, TheHashSetAnswersLikeALinearSearchOfTheList) {
+  const std::u16string long_word(250, u'Q');
+  const std::u16string file = u"the\r\nThe AND\tor ÉTÉ été straße ЖУК\n\n" + long_word + u" x";
+  LanguageFolder folder;
+  folder.WriteMinimal("Other");
+  folder.WriteUtf16("Other", "stop.txt", file);
+  CLanguage language(folder.Path());
+  language.LoadLanguage(lngOther, CLanguage::kUseStopWords);
+
+  // The list as it is stored: tokens between space, line feed and carriage
+  // return, upper-cased, cut to 199 characters.
+  std::vector<std::u16string> list;
+  std::u16string token;
+  for (const char16_t c : file + u" ") {
+    if (c == u' ' || c == u'\n' || c == u'\r') {
+      if (!token.empty()) list.push_back(ToUpper(token).substr(0, 199));
+      token.clear();
+    } else {
+      token.push_back(c);
+    }
+  }
+  std::vector<std::u16string> probes = list;
+  for (const auto& w : list) {
+    probes.push_back(w.substr(0, w.size() - 1));
+    probes.push_back(w + u"S");
+    probes.push_back(ToLower(w));
+  }
+  probes.insert(probes.end(), {u"", u"ÉTÉ", u"STRASSE", u"AND\tOR", u"AND", long_word,
+                               long_word.substr(0, 198), u"X"});
+  for (const auto& probe : probes) {
+    const bool linear = std::find(list.begin(), list.end(), probe) != list.end();
+    EXPECT_EQ(language.IsStopWord(probe), linear) << Utf16ToUtf8(probe);
+  }
+}
+
+TEST(StopWords, AreTestedOnTheWordAsCutNotOnItsStem) {
+  CLanguage language(ShippedLanguageFolder());
+  language.LoadLanguage(lngEnglish, true, true, false, false, false);
+  // OWNED is no stop word, so it is kept, though its stem OWN is one.
+  EXPECT_FALSE(language.IsStopWord(u"OWNED"));
+  EXPECT_EQ(N(language, u"OWNED"), "OWN");
+  EXPECT_TRUE(language.IsStopWord(u"OWN"));
+}
+
+// --- the steps and their order ---
+
+TEST(Normalise, AccentRemovalLeavesCharactersBeyondLatin1Alone) {
+  CLanguage language(ShippedLanguageFolder());
+  language.LoadLanguage(lngGerman, CLanguage::kRemoveAccents);
+  EXPECT_EQ(N(language, u"MÜLLER"), "MULLER");
+  EXPECT_EQ(N(language, u"ÇÀÉÎÕÜÝÿ"), "CAEIOUYY");
+  EXPECT_EQ(N(language, u"ÆØßÞ"), "ÆØßÞ");
+  EXPECT_EQ(N(language, u"ЖУРНАЛ"), "ЖУРНАЛ");
+  EXPECT_EQ(N(language, u"CAFÉ\u0416\u0100"), "CAFE\u0416\u0100");  // Ā's low byte is 0
+  EXPECT_EQ(language.Normalise(std::string_view("STRAẞE Ö")), "STRAẞE O");
+}
+
+TEST(Normalise, APlainMapEntryOfZeroEndsTheWord) {
+  LanguageFolder folder;
+  folder.WriteMinimal("Dutch");
+  std::string table = ReadFile(ShippedLanguageFolder() + "General/latin1.tbl");
+  // Row 35 ('#'): its eighth number becomes 0.
+  const std::size_t row = [&] {
+    std::size_t at = 0;
+    for (int n = 0; n < 35; ++n) at = table.find('\n', at) + 1;
+    return at;
+  }();
+  const std::size_t eol = table.find('\n', row);
+  table.replace(table.rfind(' ', eol) + 1, eol - table.rfind(' ', eol) - 1, "0");
+  folder.Write("General", "latin1.tbl", table);
+  CLanguage language(folder.Path());
+  language.LoadLanguage(lngDutch, CLanguage::kRemoveAccents);
+  EXPECT_EQ(N(language, u"AB#CD"), "AB");
+  EXPECT_EQ(N(language, u"#"), "");
+}
+
+TEST(Normalise, StepsRunAsAccentsStemmingTranslationPhonetic) {
+  LanguageFolder folder;
+  folder.WriteMinimal("German");
+  folder.WriteUtf16("German", "lang.txt", u"HAUS - HOUSE\n");
+  CLanguage german(folder.Path());
+  german.LoadLanguage(lngGerman, false, true, false, true, true);
+  EXPECT_EQ(N(german, u"HÄUSER"), "HOUSE");  // HAUSER, then HAUS, then HOUSE
+
+  folder.WriteMinimal("Dutch", 1);
+  folder.WriteUtf16("Dutch", "lang.txt", u"PH - F\n");
+  folder.Write("Dutch", "1.dat", "version 1\n");
+  CLanguage dutch(folder.Path());
+  dutch.LoadLanguage(lngDutch, false, false, true, false, true);
+  EXPECT_EQ(N(dutch, u"PHILIPS"), "FILIBS");  // translated before the sound map
+}
+
+TEST(Normalise, TheSoundMapGroupsLettersAndLeavesOtherScriptsAlone) {
+  CLanguage dutch(ShippedLanguageFolder());
+  dutch.LoadLanguage(lngDutch, CLanguage::kUsePhonetic);
+  EXPECT_EQ(dutch.GetPhoneticMode(), 1);
+  EXPECT_EQ(N(dutch, u"THOMAS"), "TONAS");
+  EXPECT_EQ(N(dutch, u"VAN"), "FAN");
+  EXPECT_EQ(N(dutch, u"R2D2"), "R2T2");
+  EXPECT_EQ(N(dutch, u"ЖУК"), "ЖУК");
+  EXPECT_EQ(N(dutch, u"ÇA'Ñ"), "SAN");
+}
+
+TEST(Normalise, EnglishPhoneticCodesAreNotCutToFourCharacters) {
+  CLanguage english(ShippedLanguageFolder());
+  english.LoadLanguage(lngEnglish, CLanguage::kUsePhonetic);
+  EXPECT_EQ(N(english, u"INTERNATIONALISATION"), "ANTRNXNLSXN");
+  EXPECT_EQ(N(english, u"SMITH"), "SM0");
+}
+
+TEST(Normalise, GermanPhoneticCodesComeFromTheRuleFile) {
+  CLanguage german(ShippedLanguageFolder());
+  german.LoadLanguage(lngGerman, CLanguage::kUsePhonetic);
+  EXPECT_EQ(german.GetPhoneticMode(), CLanguage::kPhonetMode);
+  EXPECT_EQ(N(german, u"SCHMIDT"), "ZNIT");
+  EXPECT_EQ(N(german, u"CHEMIE"), "KENI");
+  german.LoadLanguage(lngGerman, CLanguage::kUsePhonetic | CLanguage::kRemoveAccents);
+  EXPECT_EQ(N(german, u"MÜLLER"), "NULA");
+}
+
+TEST(Normalise, AnUnloadedObjectPassesWordsThrough) {
+  CLanguage language(ShippedLanguageFolder());
+  EXPECT_EQ(N(language, u"MÜLLER"), "MÜLLER");
+  EXPECT_FALSE(language.IsStopWord(u"THE"));
+}
+
+}  // namespace
+}  // namespace qm::test

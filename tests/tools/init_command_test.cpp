@@ -1,0 +1,70 @@
+// quillmere init, run as a user runs it.
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "support/test_support.h"
+
+namespace qm {
+namespace {
+
+namespace fs = std::filesystem;
+
+// Runs the host with stdout and stderr together in out.
+int Quillmere(const std::vector<std::string>& args, std::string& out) {
+  std::vector<std::string> argv{"/bin/sh", "-c", "exec \"$@\" 2>&1", "sh", QM_CLI_PATH};
+  argv.insert(argv.end(), args.begin(), args.end());
+  out.clear();
+  return test::RunProgram(argv, &out);
+}
+
+const char* const kGroupFolders[] = {"Indexes",     "Orders",  "Config",   "Repositories",
+                                     "Definitions", "Queries", "WorkData", "DataStore"};
+
+TEST(InitCommand, LaysOutEveryDataFolderOfOneGroupAndCanRunAgain) {
+  test::ScratchDir dir("init");
+  const std::string data = dir.Path() + "data";
+  std::string out;
+  ASSERT_EQ(Quillmere({"--data", data, "init", "--group", "sales"}, out), 0) << out;
+  for (const char* top : {"Language", "Converters"}) EXPECT_TRUE(fs::is_directory(data + "/" + top));
+  for (const char* sub : kGroupFolders) {
+    EXPECT_TRUE(fs::is_directory(data + "/Groups/SALES/" + sub)) << sub;
+    EXPECT_NE(out.find(data + "/Groups/SALES/" + sub + "/\n"), std::string::npos) << out;
+  }
+  const std::string first = out;
+  ASSERT_EQ(Quillmere({"--data", data, "--group", "sales", "init"}, out), 0);
+  EXPECT_EQ(out, first);
+}
+
+TEST(InitCommand, UsesTheConfiguredPathAndPublicByDefault) {
+  test::ConfiguredHome home;
+  std::string out;
+  ASSERT_EQ(Quillmere({"init"}, out), 0) << out;
+  EXPECT_TRUE(fs::is_directory(home.Data() + "Groups/PUBLIC/WorkData"));
+}
+
+TEST(InitCommand, ReportsWhatStopsIt) {
+  test::ConfiguredHome home;
+  unsetenv("MORVIL_PATH");
+  std::string out;
+  EXPECT_EQ(Quillmere({"init"}, out), 1);
+  EXPECT_EQ(out, "quillmere init: Data path is not set (Module:STDFUN,Method:GetFullDataPath)\n");
+  EXPECT_EQ(Quillmere({"--data", home.Data(), "init", "--group", "../escape"}, out), 1);
+  EXPECT_EQ(out,
+            "quillmere init: Invalid group name: ../escape (Module:STDFUN,Method:GetFullDataPath)\n");
+  test::WriteFile(home.Data() + "Language", "a file in the way");
+  EXPECT_EQ(Quillmere({"--data", home.Data(), "init"}, out), 1);
+  EXPECT_NE(out.find("quillmere init: cannot create folder " + home.Data() + "Language/"),
+            std::string::npos)
+      << out;
+  EXPECT_EQ(Quillmere({"init", "--bogus"}, out), 2);
+  EXPECT_EQ(Quillmere({"init", "--group"}, out), 2);
+  EXPECT_EQ(Quillmere({"init", "--help"}, out), 0);
+  EXPECT_EQ(out.rfind("usage: quillmere init [--data DIR] [--group NAME]\n", 0), 0u) << out;
+}
+
+}  // namespace
+}  // namespace qm

@@ -1,6 +1,5 @@
 #include "sources/share_database.h"
 
-#include <fcntl.h>
 #include <sql.h>
 #include <sqlext.h>
 
@@ -11,10 +10,11 @@
 #include <limits>
 #include <new>
 
-#include "platform/file_io.h"
 #include "platform/text_encoding.h"
 #include "shared/exception_family.h"
+#include "shared/file_operations.h"
 #include "shared/global_defs.h"
+#include "shared/mfile.h"
 #include "shared/temp_names.h"
 #include "shared/trace.h"
 #include "sources/column_conversion.h"
@@ -152,9 +152,7 @@ void CShareDatabase::Connect() {
     }
 
     if (defs_.GetConnectionMode() == ConnectionMode::ConnectionString) {
-      std::string text = defs_.GetConnectionString();
-      // Only a text that names a folder needs (and may fail for want of) a data path.
-      if (text.find("[QUILLMERE_") != std::string::npos) text = defs_.ExpandPlaceholders(text);
+      const std::string text = defs_.ExpandPlaceholders(defs_.GetConnectionString());
       SQLCHAR out[1024];
       SQLSMALLINT out_length = 0;
       const SQLRETURN rc = SQLDriverConnect(Dbc(connection), nullptr, SqlText(text), SQL_NTS, out,
@@ -507,7 +505,7 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
 bool CShareDatabase::ReadBinaryToFile(int index, CValue& value) {
   std::string piece(kBinaryPieceBytes, '\0');
   std::string path;
-  platform::FileHandle file;
+  MFile file;
   // Removes a half-written copy when reading or writing fails.
   struct Discard {
     std::string* path;
@@ -535,26 +533,17 @@ bool CShareDatabase::ReadBinaryToFile(int index, CValue& value) {
     if (indicator == SQL_NULL_DATA) return false;
     if (first) {
       path = SLGetTempWorkFilePath(defs_, kBinaryCopyCaller);
-      file = platform::OpenFile(path, O_WRONLY | O_TRUNC);
-      if (!file.IsOpen()) {
-        throw CShareDatabaseException::Text("Error writing to file %S", "GetColumnValue", nullptr,
-                                            path);
-      }
+      file.OpenFile(path, MFile::kCreate);
     }
     const bool more = rc == SQL_SUCCESS_WITH_INFO && ReadSqlState(statement_) == "01004";
     const std::size_t got = (more || indicator == SQL_NO_TOTAL || indicator < 0)
                                 ? piece.size()
                                 : std::min(static_cast<std::size_t>(indicator), piece.size());
-    if (!platform::WriteAll(file.Get(), piece.data(), got)) {
-      throw CShareDatabaseException::Text("Error writing to file %S", "GetColumnValue", nullptr,
-                                          path);
-    }
+    file.mwrite(piece.data(), got);
     if (!more) break;
   }
-  if (file.Close() != 0) {
-    throw CShareDatabaseException::Text("Error writing to file %S", "GetColumnValue", nullptr,
-                                        path);
-  }
+  file.MCommit();
+  file.Close();
   discard.armed = false;
   value.SetText(path);
   return true;
@@ -736,16 +725,9 @@ void CShareDatabase::CleanCacheColumns() {
       throw CShareDatabaseException::Text("Column cache not allocated for all columns",
                                           "CleanCacheColumns", nullptr);
     }
-    std::string failed;
-    for (const auto& path : cache_files_) {
-      std::error_code ec;
-      std::filesystem::remove(path, ec);
-      if (ec && failed.empty()) failed = path;
-    }
-    cache_files_.clear();
-    if (!failed.empty()) {
-      throw CShareDatabaseException::Text("Error deleting file: %S", "CleanCacheColumns", nullptr,
-                                          failed);
+    while (!cache_files_.empty()) {
+      DropFile(cache_files_.back());
+      cache_files_.pop_back();
     }
   });
 }

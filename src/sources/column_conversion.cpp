@@ -6,6 +6,7 @@
 
 #include "platform/text_encoding.h"
 #include "shared/exception_family.h"
+#include "shared/sql_time.h"
 
 namespace qm {
 
@@ -60,7 +61,7 @@ std::string TextOf(const CValue& from) {
     case VALUE_TYPE::Double:
       return DoubleToText(from.GetDouble());
     case VALUE_TYPE::DateTime:
-      return DateTimeToText(from.GetDateTime());
+      return SQLTimeToString(from.GetDateTime(), from.GetDateTime().fraction != 0);
     default:
       return {};
   }
@@ -147,19 +148,6 @@ std::string DoubleToText(double value) {
   const auto [end, ec] =
       std::to_chars(buffer, buffer + sizeof buffer, value, std::chars_format::general);
   return ec == std::errc() ? std::string(buffer, end) : std::string();
-}
-
-std::string DateTimeToText(const DateTimeValue& d) {
-  std::string s = std::to_string(d.year) + "-" + std::to_string(d.month) + "-" +
-                  std::to_string(d.day) + " " + std::to_string(d.hour) + ":" +
-                  std::to_string(d.minute) + ":" + std::to_string(d.second);
-  if (d.fraction != 0) {
-    std::string digits = std::to_string(d.fraction % 1000000000u);
-    digits.insert(0, 9 - digits.size(), '0');
-    digits.erase(digits.find_last_not_of('0') + 1);
-    s += "." + digits;
-  }
-  return s;
 }
 
 void ConvertColumnValue(const CValue& from, VALUE_TYPE to, CValue& out, const char* method) {

@@ -29,9 +29,5 @@ bool DoubleToInteger32(double value, int32_t& out);
 
 // The shortest text that reads back as the same double ("0.1", "1e+10").
 std::string DoubleToText(double value);
-// year-month-day hour:minute:second in decimal without leading zeros, then
-// "." and the fraction's significant digits when there is a fraction
-// (nanoseconds: 123000000 is ".123"), so the text reads back to the same value.
-std::string DateTimeToText(const DateTimeValue& d);
 
 }  // namespace qm

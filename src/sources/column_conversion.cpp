@@ -107,6 +107,19 @@ bool ParseInteger64(std::string_view text, int64_t& out) {
 }
 
 bool ParseInteger32(std::string_view text, int32_t& out) {
+  if (!text.empty() && text.size() <= 9) {
+    // Plain digits, the usual key: nine cannot leave 32 bits.
+    uint32_t v = 0;  // unsigned: other bytes may make it wrap before they are seen
+    bool digits = true;
+    for (const char c : text) {
+      digits = digits && c >= '0' && c <= '9';
+      v = v * 10 + static_cast<uint32_t>(c - '0');
+    }
+    if (digits) {
+      out = static_cast<int32_t>(v);
+      return true;
+    }
+  }
   int64_t v = 0;
   if (!ParseInteger64(text, v)) return false;
   if (v < std::numeric_limits<int32_t>::min() || v > std::numeric_limits<int32_t>::max()) {

@@ -714,7 +714,12 @@ int CShareDatabase::GetColumnValueFromCache(int index, VALUE_TYPE requested, CVa
     }
     const auto slot = static_cast<std::size_t>(index - 1);
     if (cache_null_[slot]) return kValueNull;
-    ConvertColumnValue(cache_[slot], requested, value, "GetColumnValueFromCache");
+    const CValue& cached = cache_[slot];
+    if (requested == VALUE_TYPE::Integer && cached.GetType() == VALUE_TYPE::Integer) {
+      value.SetInteger(cached.GetInteger());  // keys: the most frequent read
+    } else {
+      ConvertColumnValue(cached, requested, value, "GetColumnValueFromCache");
+    }
     return kValueRead;
   });
 }

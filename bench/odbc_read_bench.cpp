@@ -5,11 +5,11 @@
 //   odbc_read_bench [--rows N] [--runs R] [--dir FOLDER] [--only native|plain|engine]
 //
 // The database is generated in a temporary folder and removed at the end. Each
-// run reads every row once with each reader, in turn; the figures are the
-// medians of wall time and of the process's processor time (the fairer measure
-// on a machine shared with other work). The engine's reader should stay within
-// 1.3 times the plain ODBC loop's processor time; the exit status is 1 when it
-// does not.
+// run reads every row once with each reader, in turn. The table shows the
+// medians of wall time and of the process's processor time; the comparison
+// uses the best processor time of each reader, the measure least disturbed by
+// other work on a shared machine. The engine's reader should stay within 1.3
+// times the plain ODBC loop; the exit status is 1 when it does not.
 #include <sql.h>
 #include <sqlext.h>
 #include <sqlite3.h>
@@ -258,13 +258,20 @@ int Run(int rows, int runs, fs::path folder, const std::string& only) {
       return 2;
     }
   }
-  const double ratio = Median(readers[2].cpu_seconds) / Median(readers[1].cpu_seconds);
-  std::printf("\nengine / plain ODBC: %.3f processor time, %.3f wall time (allowed %.1f): %s\n",
-              ratio, Median(readers[2].seconds) / Median(readers[1].seconds), kAllowedRatio,
-              ratio <= kAllowedRatio ? "within" : "TOO SLOW");
-  std::printf("plain ODBC / native: %.3f processor time, %.3f wall time\n",
-              Median(readers[1].cpu_seconds) / Median(readers[0].cpu_seconds),
-              Median(readers[1].seconds) / Median(readers[0].seconds));
+  auto best = [](const std::vector<double>& v) { return *std::min_element(v.begin(), v.end()); };
+  const Reader& native = readers[0];
+  const Reader& plain = readers[1];
+  const Reader& engine = readers[2];
+  const double ratio = best(engine.cpu_seconds) / best(plain.cpu_seconds);
+  std::printf(
+      "\nengine / plain ODBC: %.3f best processor time (%.3f median processor, %.3f median "
+      "wall); allowed %.1f: %s\n",
+      ratio, Median(engine.cpu_seconds) / Median(plain.cpu_seconds),
+      Median(engine.seconds) / Median(plain.seconds), kAllowedRatio,
+      ratio <= kAllowedRatio ? "within" : "TOO SLOW");
+  std::printf("plain ODBC / native: %.3f best processor time (%.3f median wall)\n",
+              best(plain.cpu_seconds) / best(native.cpu_seconds),
+              Median(plain.seconds) / Median(native.seconds));
   return ratio <= kAllowedRatio ? 0 : 1;
 }
 

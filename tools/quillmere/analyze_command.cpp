@@ -127,13 +127,13 @@ std::unique_ptr<CWordPipeline> MakePipeline(const AnalyzeOptions& o, const Globa
   std::string why;
   try {
     const std::string folder = defs.GetFolder(FolderKind::Language);
-    if (platform::FileExists(folder + language_folder + "info.txt")) {
-      return std::make_unique<CWordPipeline>(defs, options);
+    if (!platform::FileExists(folder + language_folder + "info.txt")) {
+      why = folder + " has no " + language_folder + "info.txt";
     }
-    why = folder + " has no " + language_folder + "info.txt";
   } catch (CExceptionBase&) {
     why = "no data directory (--data DIR or the configured path)";
   }
+  if (why.empty()) return std::make_unique<CWordPipeline>(defs, options);
   const std::string shipped = ShippedDataFolder("Language/" + language_folder + "info.txt") + "Language/";
   std::fprintf(stderr, "quillmere analyze: %s; using the shipped language data in %s\n",
                why.c_str(), shipped.c_str());

@@ -125,27 +125,7 @@ TEST(WordPipeline, PositionsRunOnAcrossValuesWithSentenceGaps) {
   EXPECT_EQ(position, 9);
 }
 
-TEST(WordPipeline, LanguageFilesAreReadOnlyForLanguageSteps) {
-  ScratchDir empty("no-language");
-  // No step: words as cut, whatever folder or language number is named.
-  CWordPipeline plain(empty.Path() + "Language/", Options(99, 0));
-  EXPECT_EQ(plain.Language(), nullptr);
-  EXPECT_EQ(Written(plain, "the élan"), "1:THE 2:ÉLAN");
-
-  std::string text =
-      FailureText([&] { CWordPipeline p(empty.Path(), Options(lngEnglish, CLanguage::kUseStopWords)); });
-  EXPECT_TRUE(Contains(text, "Error opening file: " + empty.Path() +
-                                 "English/info.txt (Module:WinFile,Method:OpenWinFile)"))
-      << text;
-
-  LanguageFolder folder;
-  std::filesystem::create_directories(folder.Path() + "English/info.txt");  // a folder, not a file
-  text = FailureText([&] { CWordPipeline p(folder.Path(), Options(lngEnglish, 16)); });
-  EXPECT_TRUE(Contains(text, "Error reading from file (Module:WinFile,Method:ReadFromFile)")) << text;
-  EXPECT_TRUE(Contains(text, "(Module:Language,Method:LoadLanguage)")) << text;
-}
-
-TEST(WordPipeline, SettingsGiveTheDataDirectorysLanguageFolder) {
+TEST(WordPipeline, LanguageDataComesFromTheSettingsAndOnlyForLanguageSteps) {
   ConfiguredHome home;
   const std::string language = home.Data() + "Language/";
   WriteFile(language + "General/latin1.tbl", ReadFile(ShippedLanguageFolder() + "General/latin1.tbl"));
@@ -156,11 +136,18 @@ TEST(WordPipeline, SettingsGiveTheDataDirectorysLanguageFolder) {
   EXPECT_EQ(configured.Language()->GetLanguageFolder(), language);
   EXPECT_EQ(Written(configured, "the rivers"), "1:THE");
 
+  // A folder where a file should be cannot be read.
+  std::filesystem::create_directories(language + "Dutch/info.txt");
+  std::string text = FailureText([&] { CWordPipeline p(defs, Options(lngDutch, 16)); });
+  EXPECT_TRUE(Contains(text, "Error reading from file (Module:WinFile,Method:ReadFromFile)")) << text;
+  EXPECT_TRUE(Contains(text, "(Module:Language,Method:LoadLanguage)")) << text;
+
+  // No step: words as cut, with no data path and whatever language number.
   unsetenv("MORVIL_PATH");
-  CWordPipeline plain(defs, Options(lngEnglish, 0));
-  EXPECT_EQ(Written(plain, "the rivers"), "1:THE 2:RIVERS");
-  const std::string text =
-      FailureText([&] { CWordPipeline p(defs, Options(lngEnglish, CLanguage::kUseStopWords)); });
+  CWordPipeline plain(defs, Options(99, 0));
+  EXPECT_EQ(plain.Language(), nullptr);
+  EXPECT_EQ(Written(plain, "the \xC3\xA9lan"), "1:THE 2:\xC3\x89LAN");
+  text = FailureText([&] { CWordPipeline p(defs, Options(lngEnglish, CLanguage::kUseStopWords)); });
   EXPECT_TRUE(Contains(text, "Data path is not set (Module:STDFUN,Method:GetFullDataPath)")) << text;
   EXPECT_TRUE(Contains(text, "(Module:Language,Method:CLanguage)")) << text;
 }

@@ -6,6 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <thread>
 
@@ -65,12 +66,24 @@ ProcessResult RunProcess(const std::vector<std::string>& argv, std::chrono::mill
 
   posix_spawn_file_actions_t actions;
   posix_spawn_file_actions_init(&actions);
-  // The child starts with nothing on standard input.
+  // Like a program started in a console of its own: nothing on standard input,
+  // and its output never mixes into the host's (a web server's response, say).
   posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
-  // Its own process group, so a kill at the time-out also reaches what it started.
+  posix_spawn_file_actions_addopen(&actions, 1, "/dev/null", O_WRONLY, 0);
+  posix_spawn_file_actions_addopen(&actions, 2, "/dev/null", O_WRONLY, 0);
   posix_spawnattr_t attributes;
   posix_spawnattr_init(&attributes);
-  posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETPGROUP);
+  // Its own process group, so a kill at the time-out also reaches what it
+  // started; and the signal state of a fresh program, whatever the host
+  // blocked or ignored (an ignored SIGPIPE or SIGCHLD would change how it runs).
+  sigset_t no_signals;
+  sigemptyset(&no_signals);
+  sigset_t all_signals;
+  sigfillset(&all_signals);
+  posix_spawnattr_setsigmask(&attributes, &no_signals);
+  posix_spawnattr_setsigdefault(&attributes, &all_signals);
+  posix_spawnattr_setflags(&attributes,
+                           POSIX_SPAWN_SETPGROUP | POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF);
   posix_spawnattr_setpgroup(&attributes, 0);
   pid_t pid = -1;
   const int rc = posix_spawnp(&pid, args[0], &actions, &attributes, args.data(), environ);

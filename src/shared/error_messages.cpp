@@ -1,14 +1,12 @@
 #include "shared/error_messages.h"
 
-#include <dlfcn.h>
-
-#include <filesystem>
 #include <mutex>
 #include <shared_mutex>
 
 #include "platform/config_store.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
+#include "shared/shipped_data.h"
 
 namespace qm {
 
@@ -56,17 +54,6 @@ bool ParseDecimal(std::u16string_view field, int32_t& out) {
   if (!any) return false;
   out = static_cast<int32_t>(negative ? -value : value);
   return true;
-}
-
-std::string LibraryDataFolder() {
-  Dl_info info{};
-  if (dladdr(reinterpret_cast<void*>(&LookupErrorMessage), &info) == 0 || !info.dli_fname) {
-    return {};
-  }
-  std::error_code ec;
-  auto lib = std::filesystem::canonical(info.dli_fname, ec);
-  if (ec) return {};
-  return (lib.parent_path().parent_path() / "share" / "quillmere").string() + "/";
 }
 
 }  // namespace
@@ -122,14 +109,7 @@ std::string ErrorMessageFolder() {
     if (system.back() != '/') system += '/';
     return system;
   }
-  std::error_code ec;
-  for (const std::string& root : {LibraryDataFolder(), std::string(QM_SOURCE_DATA_DIR),
-                                  std::string(QM_INSTALL_DATA_DIR)}) {
-    if (root.empty()) continue;
-    const std::string folder = root + "System/";
-    if (std::filesystem::exists(folder + "mrvconf.ini", ec)) return folder;
-  }
-  return std::string(QM_SOURCE_DATA_DIR) + "System/";
+  return ShippedDataFolder("System/mrvconf.ini") + "System/";
 }
 
 void LoadErrorMessages() { LoadErrorMessagesFromFile(ErrorMessageFolder() + "mrvconf.ini"); }

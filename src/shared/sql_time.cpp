@@ -1,5 +1,7 @@
 #include "shared/sql_time.h"
 
+#include <algorithm>
+
 namespace qm {
 
 DateTimeValue SystemTimeToSQLTime(const platform::LocalTime& time) {
@@ -18,7 +20,13 @@ std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction) {
   std::string s = std::to_string(time.year) + "-" + std::to_string(time.month) + "-" +
                   std::to_string(time.day) + " " + std::to_string(time.hour) + ":" +
                   std::to_string(time.minute) + ":" + std::to_string(time.second);
-  if (with_fraction) s += "." + std::to_string(time.fraction);
+  if (with_fraction) {
+    // The fraction counts nanoseconds: 5,000,000 is ".005", never ".5000000".
+    std::string digits = std::to_string(time.fraction % 1000000000u);
+    digits.insert(0, 9 - digits.size(), '0');
+    digits.erase(std::max<std::size_t>(digits.find_last_not_of('0') + 1, 1));
+    s += "." + digits;
+  }
   return s;
 }
 

@@ -11,8 +11,9 @@ namespace qm {
 // The local time as a date with fraction 0.
 DateTimeValue SystemTimeToSQLTime(const platform::LocalTime& time);
 
-// "Y-M-D h:m:s" in decimal without leading zeros, then "." and the fraction
-// when asked for.
+// "Y-M-D h:m:s" in decimal without leading zeros, then, when asked for, "."
+// and the fraction of a second (nanoseconds, trailing zeros dropped: ".123"),
+// so the text reads back as the same time.
 std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction = false);
 
 }  // namespace qm

@@ -4,6 +4,7 @@
 
 #include "platform/text_encoding.h"
 #include "shared/exception_family.h"
+#include "shared/global_defs.h"
 #include "text/double_metaphone.h"
 #include "text/language_file.h"
 
@@ -71,6 +72,10 @@ const char* LanguageStemmerName(int32_t language) {
 CLanguage::CLanguage(std::string language_folder) : folder_(std::move(language_folder)) {
   if (!folder_.empty() && folder_.back() != '/') folder_.push_back('/');
 }
+
+CLanguage::CLanguage(const CGlobalDefs& defs)
+    : CLanguage(Guard<CLanguageException, CLanguageUnknownException>(
+          "CLanguage", [&] { return defs.GetFolder(FolderKind::Language); })) {}
 
 CLanguage::~CLanguage() = default;
 

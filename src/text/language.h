@@ -20,6 +20,8 @@
 
 namespace qm {
 
+class CGlobalDefs;
+
 enum lngLanguageEnum : int32_t {
   lngDanish = 1,
   lngEnglish = 2,
@@ -58,6 +60,9 @@ class CLanguage {
   // language_folder: the languages folder (ending in "/") holding one folder
   // per language and General/ with the character tables.
   explicit CLanguage(std::string language_folder);
+  // The Language folder (kind 17) of the settings' data directory; a missing
+  // data path raises a "Language" error with the settings' failure chained.
+  explicit CLanguage(const CGlobalDefs& defs);
   ~CLanguage();
   CLanguage(const CLanguage&) = delete;
   CLanguage& operator=(const CLanguage&) = delete;

@@ -1,17 +1,23 @@
 #include "text/language_file.h"
 
-#include "platform/file_io.h"
-#include "shared/exception_family.h"
+#include "shared/win_file.h"
 
 namespace qm::text {
 
 std::string ReadLanguageFile(const std::string& path) {
-  std::string bytes;
-  if (platform::ReadWholeFile(path, bytes)) return bytes;
-  if (platform::FileExists(path)) {
-    throw CWinFileException::Text("Error reading from file", "ReadFromFile", nullptr);
+  WinFile file;
+  file.OpenWinFile(path, platform::FileAccess::Read, platform::kFileAttributeNormal,
+                   platform::FileDisposition::OpenExisting);
+  // The size is a first guess only: the file is read to its end.
+  std::string bytes(static_cast<std::size_t>(file.Size()) + 1, '\0');
+  std::size_t used = 0;
+  for (;;) {
+    used += file.Read(bytes.data() + used, bytes.size() - used);
+    if (used < bytes.size()) break;
+    bytes.resize(bytes.size() * 2);
   }
-  throw CWinFileException::Text("Error opening file: %s", "OpenWinFile", nullptr, path);
+  bytes.resize(used);
+  return bytes;
 }
 
 namespace {

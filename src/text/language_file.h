@@ -9,8 +9,9 @@
 
 namespace qm::text {
 
-// The file's bytes; a file that cannot be opened raises the "WinFile" error
-// "Error opening file: %s", one that cannot be read "Error reading from file".
+// The file's bytes, read through WinFile: a file that cannot be opened raises
+// its "Error opening file: %s", one that cannot be read "Error reading from
+// file".
 std::string ReadLanguageFile(const std::string& path);
 
 // Tokens of an 8-bit file: runs between space, line feed, carriage return,

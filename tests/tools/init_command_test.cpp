@@ -39,6 +39,55 @@ TEST(InitCommand, LaysOutEveryDataFolderOfOneGroupAndCanRunAgain) {
   EXPECT_EQ(out, first);
 }
 
+// Every file below the shipped Language folder, relative to it.
+std::vector<std::string> ShippedLanguageFiles() {
+  std::vector<std::string> files;
+  const std::string root = std::string(QM_SOURCE_DATA_DIR) + "Language/";
+  for (const auto& entry : fs::recursive_directory_iterator(root)) {
+    if (entry.is_regular_file()) files.push_back(entry.path().lexically_relative(root).string());
+  }
+  return files;
+}
+
+TEST(InitCommand, CopiesTheLanguageDataAndKeepsFilesThatExist) {
+  test::ScratchDir dir("init-language");
+  const std::string data = dir.Path() + "data/";
+  const std::string shipped = std::string(QM_SOURCE_DATA_DIR) + "Language/";
+  const std::string language = data + "Language/";
+  std::string out;
+  ASSERT_EQ(Quillmere({"--data", data, "init"}, out), 0) << out;
+  const auto files = ShippedLanguageFiles();
+  ASSERT_GT(files.size(), 40u);
+  for (const auto& file : files) {
+    EXPECT_EQ(test::ReadFile(language + file), test::ReadFile(shipped + file)) << file;
+  }
+  for (const char* folder : {"English/", "General/", "LICENSES/"}) {
+    EXPECT_NE(out.find(language + folder + "\n"), std::string::npos) << out;
+  }
+
+  // A changed file stays and is named; a deleted one comes back; an unchanged
+  // one is not mentioned.
+  test::WriteFile(language + "English/stop.txt", test::Utf16LeFile(u"mine"));
+  fs::remove(language + "German/1.dat");
+  fs::remove_all(language + "Danish");
+  ASSERT_EQ(Quillmere({"--data", data, "init"}, out), 0) << out;
+  EXPECT_EQ(test::ReadFile(language + "English/stop.txt"), test::Utf16LeFile(u"mine"));
+  EXPECT_EQ(test::ReadFile(language + "German/1.dat"), test::ReadFile(shipped + "German/1.dat"));
+  EXPECT_EQ(test::ReadFile(language + "Danish/stop.txt"), test::ReadFile(shipped + "Danish/stop.txt"));
+  EXPECT_NE(out.find("quillmere init: kept " + language +
+                     "English/stop.txt (it differs from the shipped file)\n"),
+            std::string::npos)
+      << out;
+  EXPECT_EQ(out.find("kept " + language + "English/info.txt"), std::string::npos) << out;
+
+  fs::remove_all(language + "French");
+  test::WriteFile(language + "French", "a file in the way");
+  EXPECT_EQ(Quillmere({"--data", data, "init"}, out), 1);
+  EXPECT_NE(out.find("quillmere init: cannot create folder " + language + "French/: "),
+            std::string::npos)
+      << out;
+}
+
 TEST(InitCommand, UsesTheConfiguredPathAndPublicByDefault) {
   test::ConfiguredHome home;
   std::string out;

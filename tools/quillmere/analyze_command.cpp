@@ -1,5 +1,6 @@
 // quillmere analyze: shows how a text is cut and normalised for an index, one
-// line per word the indexer considers, through the splitter the builder uses.
+// line per word the indexer considers, through the word pipeline the builder
+// uses.
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
@@ -7,11 +8,14 @@
 #include <vector>
 
 #include "command_registry.h"
+#include "platform/file_io.h"
 #include "platform/text_encoding.h"
 #include "shared/exception.h"
-#include "text/separators.h"
-#include "text/word_filter.h"
-#include "text/word_splitter.h"
+#include "shared/global_defs.h"
+#include "shared/shipped_data.h"
+#include "terminal_text.h"
+#include "text/language.h"
+#include "text/word_pipeline.h"
 
 namespace qm::cli {
 namespace {
@@ -26,13 +30,47 @@ struct AnalyzeOptions {
   bool html = false;
   std::string separators;
   bool default_separators = true;
+  bool help = false;
 
-  bool AnyLanguageStep() const { return stop_words || accents || stemming || translation || phonetic; }
+  WordPipelineOptions Pipeline() const {
+    WordPipelineOptions p;
+    p.language = language;
+    p.language_flags = (stemming ? CLanguage::kUseStemming : 0) |
+                       (phonetic ? CLanguage::kUsePhonetic : 0) |
+                       (accents ? CLanguage::kRemoveAccents : 0) |
+                       (translation ? CLanguage::kUseCharacterTranslation : 0) |
+                       (stop_words ? CLanguage::kUseStopWords : 0);
+    p.separators = Utf8ToUtf16(separators);
+    p.general_flags = (default_separators ? WordPipelineOptions::kAddDefaultSeparators : 0) |
+                      (html ? WordPipelineOptions::kRemoveHtml : 0);
+    return p;
+  }
 };
 
 constexpr const char* kUsage =
     "analyze [--language N] [--stopwords] [--accents] [--stemming] [--translation] [--phonetic] "
     "[--html] [--separators TEXT] [--no-default-separators]";
+
+void PrintHelp() {
+  std::printf(
+      "usage: quillmere [--data DIR] %s\n\n"
+      "Reads UTF-8 text on standard input and prints one line per word the indexer\n"
+      "considers: position<TAB>word as cut<TAB>normalised form. The form is empty for\n"
+      "a stop word or a word that normalises to nothing; such words are not indexed\n"
+      "and show the position as it stands. A sentence end leaves a gap of one position.\n\n"
+      "  --language N               1 Danish, 2 English (default), 3 French, 4 Spanish,\n"
+      "                             5 Portuguese, 6 Italian, 7 German, 8 Dutch,\n"
+      "                             9 Swedish, 10 Norwegian, 11 Russian, 12 Other\n"
+      "  --stopwords --accents --stemming --translation --phonetic\n"
+      "                             the language steps of the index\n"
+      "  --html                     remove scripts and tags first\n"
+      "  --separators TEXT          the separator option (%%NNN, <SPACE>, <TAB>, ...)\n"
+      "  --no-default-separators    do not add the default separators\n\n"
+      "Language data comes from the data directory's Language folder (--data DIR or\n"
+      "the configured path). Without one, or when it has no data for the language,\n"
+      "the shipped language data is used and a note on standard error says so.\n",
+      kUsage);
+}
 
 int UsageError(const std::string& what) {
   std::fprintf(stderr, "quillmere analyze: %s\nusage: quillmere [--data DIR] %s\n", what.c_str(), kUsage);
@@ -49,6 +87,7 @@ bool ParseOptions(const std::vector<std::string>& args, AnalyzeOptions& o, std::
     else if (a == "--phonetic") o.phonetic = true;
     else if (a == "--html") o.html = true;
     else if (a == "--no-default-separators") o.default_separators = false;
+    else if (a == "--help" || a == "-h") o.help = true;
     else if (a == "--separators" || a == "--language") {
       if (i + 1 >= args.size()) {
         error = a + " needs a value";
@@ -74,15 +113,31 @@ bool ParseOptions(const std::vector<std::string>& args, AnalyzeOptions& o, std::
   return true;
 }
 
-// THE place where the language steps plug in: the normaliser for the options,
-// or null when no language step is asked for. The language object is not part
-// of the engine yet, so asking for a step is refused rather than ignored.
-std::unique_ptr<CWordFilter> MakeLanguageFilter(const AnalyzeOptions& o, const GlobalOptions& /*global*/,
-                                                std::string& error) {
-  if (!o.AnyLanguageStep()) return nullptr;
-  error = "language processing (--stopwords, --accents, --stemming, --translation, --phonetic) "
-          "is not available in this build";
-  return nullptr;
+// The pipeline for the options. Language data comes from the data
+// directory's Language folder; when there is no data directory, or its
+// Language folder has no data for the language (init not run), the shipped
+// language data is used and a note on standard error says so.
+std::unique_ptr<CWordPipeline> MakePipeline(const AnalyzeOptions& o, const GlobalOptions& global) {
+  const WordPipelineOptions options = o.Pipeline();
+  if (!options.UsesLanguage()) return std::make_unique<CWordPipeline>(std::string(), options);
+
+  CGlobalDefs defs;
+  if (!global.data_dir.empty()) defs.SetDataPath(global.data_dir);
+  const std::string language_folder = std::string(LanguageFolderName(o.language)) + "/";
+  std::string why;
+  try {
+    const std::string folder = defs.GetFolder(FolderKind::Language);
+    if (!platform::FileExists(folder + language_folder + "info.txt")) {
+      why = folder + " has no " + language_folder + "info.txt";
+    }
+  } catch (CExceptionBase&) {
+    why = "no data directory (--data DIR or the configured path)";
+  }
+  if (why.empty()) return std::make_unique<CWordPipeline>(defs, options);
+  const std::string shipped = ShippedDataFolder("Language/" + language_folder + "info.txt") + "Language/";
+  std::fprintf(stderr, "quillmere analyze: %s; using the shipped language data in %s\n",
+               why.c_str(), shipped.c_str());
+  return std::make_unique<CWordPipeline>(shipped, options);
 }
 
 std::string ReadAll(std::FILE* in) {
@@ -97,20 +152,16 @@ int Analyze(const GlobalOptions& global, const std::vector<std::string>& args) {
   AnalyzeOptions options;
   std::string error;
   if (!ParseOptions(args, options, error)) return UsageError(error);
-  std::unique_ptr<CWordFilter> filter = MakeLanguageFilter(options, global, error);
-  if (!error.empty()) {
-    std::fprintf(stderr, "quillmere analyze: %s\n", error.c_str());
-    return kExitError;
+  if (options.help) {
+    PrintHelp();
+    return kExitOk;
   }
-
-  CWordSplitter splitter(
-      CSeparatorSet(BuildSeparators(Utf8ToUtf16(options.separators), options.default_separators)),
-      options.html, filter.get());
+  const std::unique_ptr<CWordPipeline> pipeline = MakePipeline(options, global);
   const std::string text = ReadAll(stdin);
 
   std::string out;
   std::int32_t position = 0;
-  splitter.Split(text, position, [&](const SplitWord& w) {
+  pipeline->ConsideredWords(text, position, [&](const SplitWord& w) {
     out += std::to_string(w.position);
     out += '\t';
     AppendUtf16AsUtf8(w.cut, out);
@@ -130,7 +181,7 @@ int RunAnalyze(const GlobalOptions& global, const std::vector<std::string>& args
   try {
     return Analyze(global, args);
   } catch (CExceptionBase& e) {
-    std::fprintf(stderr, "quillmere analyze: %s", e.GetFullTextUtf8(kLevelWritten).c_str());
+    std::fprintf(stderr, "quillmere analyze: %s", TerminalText(e).c_str());
     return kExitError;
   }
 }

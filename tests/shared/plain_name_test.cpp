@@ -1,10 +1,11 @@
 // Names that become file and lock names: what is refused and how it is shown.
+#include "shared/plain_name.h"
+
 #include <gtest/gtest.h>
 
 #include <string>
 
 #include "shared/exception_family.h"
-#include "shared/plain_name.h"
 
 namespace qm {
 namespace {
@@ -24,10 +25,10 @@ TEST(PlainName, AcceptsOrdinaryNamesUpToTheLimit) {
 
 TEST(PlainName, RefusesWhatCouldLeaveItsFolder) {
   for (const std::string& name :
-       {std::string(), std::string("."), std::string(".."), std::string("../x"),
-        std::string("a/b"), std::string("a\\b"), std::string("/abs"), std::string("\"q\""),
-        std::string("tab\there"), std::string("nl\n"), std::string("nul\0x", 5),
-        std::string("del\x7F"), std::string("c1\xC2\x85"), std::string(200, 'n')}) {
+       {std::string(), std::string("."), std::string(".."), std::string("../x"), std::string("a/b"),
+        std::string("a\\b"), std::string("/abs"), std::string("\"q\""), std::string("tab\there"),
+        std::string("nl\n"), std::string("nul\0x", 5), std::string("del\x7F"),
+        std::string("c1\xC2\x85"), std::string(200, 'n')}) {
     EXPECT_FALSE(IsPlainName(name)) << ShowName(name);
   }
 }
@@ -41,7 +42,7 @@ TEST(PlainName, RefusalNamesTheKindTheNameAndTheReason) {
               "Invalid findex name \"..\": a name must not be \".\" or \"..\" "
               "(Module:PiStartPoint,Method:ExecuteW)\r\n");
   }
-  EXPECT_EQ(ShowName("a\x01" "b\xC2\x9F"), "a\\x01b\\x9F");
+  EXPECT_EQ(ShowName(std::string("a\x01") + "b\xC2\x9F"), "a\\x01b\\x9F");
   EXPECT_EQ(ShowName(std::string(70, 'x')), std::string(60, 'x') + "...");
   EXPECT_NO_THROW(RequirePlainName<CPiStartPointException>("group", "PUBLIC", "SetGroup"));
 }

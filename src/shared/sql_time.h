@@ -15,4 +15,8 @@ DateTimeValue SystemTimeToSQLTime(const platform::LocalTime& time);
 // when asked for.
 std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction = false);
 
+// The form for date literals inside SQL: "2024-03-09 14:05:07", zero-padded,
+// then "." and the fraction as 9 digits of nanoseconds when asked for.
+std::string SQLTimeToSqlLiteral(const DateTimeValue& time, bool with_fraction = false);
+
 }  // namespace qm

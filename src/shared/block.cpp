@@ -556,6 +556,9 @@ int32_t CBlock::GetRowStartId(const CValue& key, const CValue& upper, int32_t ma
   }
   if ((flags & kFlagLess) != 0) {
     if ((flags & kFlagEqual) != 0 && c == 0) return id;
+    // Every row of the block is below the key: the last one is the answer,
+    // not the one before it.
+    if (c == -1) return id;
     return has_previous ? previous : kInPreviousBlock;
   }
   return at_end ? kReachedEnd : kNotFound;

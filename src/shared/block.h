@@ -137,7 +137,8 @@ class CBlock {
   // --- searches over leaf rows (value, id), rows of the key's type ---
   // The id of the first row not smaller than key that matches (mode 0:
   // CValue::Match and not above upper; mode 1: equal), else by the flags:
-  // 64 greater (-3 when none here), 128 less (-4 when no row before), else
+  // 64 greater (-3 when none here), 128 less (the last row below key; -4
+  // when no row here is), else
   // -1 when every row was read, -2 when not. 1 for a block without rows.
   int32_t GetRowStartId(const CValue& key, const CValue& upper, int32_t match_mode,
                         int32_t flags);

@@ -67,6 +67,8 @@ struct CIndexHeader {
   int64_t EncodedSize() const;
   bool FitsHeaderBlock() const;
 
+  bool operator==(const CIndexHeader&) const = default;
+
   // Back to the values of a fresh header, lists emptied.
   void Reset() { *this = CIndexHeader{}; }
 

@@ -19,6 +19,8 @@ class BFile;
 struct OrderColumn {
   std::string Name;
   std::array<int32_t, 3> BuilderValues{};
+
+  bool operator==(const OrderColumn&) const = default;
 };
 
 // The order columns in statement order (unlike a findex's column map).
@@ -61,6 +63,8 @@ struct COrderInfo {
   // rows, by the date/time key (update flag 1; "'" literals, or "#" ones
   // with date_style) or by the key.
   std::string GetSelectDataSQL(bool date_style) const;
+
+  bool operator==(const COrderInfo&) const = default;
 
   void Reset() { *this = COrderInfo{}; }
 

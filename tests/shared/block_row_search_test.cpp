@@ -8,20 +8,13 @@
 
 #include "shared/block.h"
 #include "shared/exception_family.h"
+#include "test_values.h"
 
 namespace qm {
 namespace {
 
-CValue Text(std::string_view s) {
-  CValue v;
-  v.SetText(s);
-  return v;
-}
-CValue Int(int32_t i) {
-  CValue v;
-  v.SetInteger(i);
-  return v;
-}
+CValue Text(std::string_view s) { return test::Value(s); }
+CValue Int(int32_t i) { return test::Value(i); }
 
 // A leaf whose rows are appended as given (no sorting).
 CBlock Leaf(const std::vector<std::pair<std::string, int32_t>>& rows) {
@@ -152,10 +145,10 @@ TEST(StartSearch, NumbersMatchWhenNotSmaller) {
 TEST(NodeSearch, DescendsIntoTheChildBeforeTheFirstSeparatorNotBelowTheKey) {
   CBlock node(64);
   node.InsertInt(5);
-  for (const auto& [separator, child] : std::vector<std::pair<std::string, int32_t>>{{"d", 6}, {"m", 7}}) {
-    node.InsertRow(Text(separator));
-    node.InsertInt(child);
-  }
+  node.InsertRow(Text("d"));
+  node.InsertInt(6);
+  node.InsertRow(Text("m"));
+  node.InsertInt(7);
   EXPECT_EQ(node.GetNodeChildId(Text("a")), 5);
   EXPECT_EQ(node.GetNodeChildId(Text("d")), 5);
   EXPECT_EQ(node.GetNodeChildId(Text("e")), 6);

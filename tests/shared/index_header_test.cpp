@@ -22,59 +22,28 @@ using test::RaisedText;
 
 CIndexHeader FullHeader() {
   CIndexHeader h;
-  h.HeaderWord0 = -5;
-  h.BlockNum = 77;
-  h.BuildState = 1;
-  h.FindexType = 4;
-  h.IndexName = "Books";
-  h.TableName = "books";
-  h.SqlUsedAsTable = 1;
+  h.HeaderWord0 = -5; h.BlockNum = 77; h.BuildState = 1; h.FindexType = 4;
+  h.IndexName = "Books"; h.TableName = "books"; h.SqlUsedAsTable = 1; h.KeyColumn = "id";
   h.SqlSelect = "select id, title from books where x = 'ä'";
-  h.KeyColumn = "id";
   h.Columns = {{"body", {}}, {"title", {{"CONTENT_WEIGHT", "3"}, {"CONTENT_TYPE", "URL"}}}};
-  h.SortMax = 123456;
-  h.WordCount = 9;
-  h.KeyCount = 8;
-  h.DistinctWordCount = 7;
-  h.ConnectionString = "DSN=books;UID=sa;PWD=secret";
-  h.DisplayName = "BOOKS";
-  h.BuildTime = {2024, 3, 9, 14, 5, 7, 0};
-  h.LastUpdateTime = {2024, 3, 10, 1, 2, 3, 0};
-  h.DateTimeKeyColumn = "changed";
-  h.MaxDateTimeKey = {2023, 12, 31, 23, 59, 59, 999999999};
-  h.ExtraWord1 = 11;
-  h.ExtraWord3 = 33;
-  h.ExtraWord2 = 22;
-  h.GeneralFlags = 1 | 2 | 8 | 16;
-  h.IndexMaxSize = 2;
-  h.IndexStartValue = 100;
-  h.Separators = u" .,;\u00ab";
-  h.UpdateFlags = 3;
-  h.UpdateSupport = 1;
-  h.LanguageFlags = 21;
-  h.Language = 5;
+  h.SortMax = 123456; h.WordCount = 9; h.KeyCount = 8; h.DistinctWordCount = 7;
+  h.ConnectionString = "DSN=books;UID=sa;PWD=secret"; h.DisplayName = "BOOKS";
+  h.BuildTime = {2024, 3, 9, 14, 5, 7, 0}; h.LastUpdateTime = {2024, 3, 10, 1, 2, 3, 0};
+  h.DateTimeKeyColumn = "changed"; h.MaxDateTimeKey = {2023, 12, 31, 23, 59, 59, 999999999};
+  h.ExtraWord1 = 11; h.ExtraWord3 = 33; h.ExtraWord2 = 22; h.GeneralFlags = 1 | 2 | 8 | 16;
+  h.IndexMaxSize = 2; h.IndexStartValue = 100; h.Separators = u" .,;\u00ab"; h.UpdateFlags = 3;
+  h.UpdateSupport = 1; h.LanguageFlags = 21; h.Language = 5;
   return h;
 }
 
 COrderInfo FullOrder() {
   COrderInfo o;
-  o.OrderType = 2;
-  o.OrderName = "ByTitle";
-  o.TableName = "books";
-  o.SqlSelect = "select * from books";
+  o.OrderType = 2; o.OrderName = "ByTitle"; o.TableName = "books"; o.SqlSelect = "select * from books";
   o.Columns = {{"title", {1, 2, 3}}, {"price", {-4, 5, 6}}};
-  o.KeyColumn = "id";
-  o.Count = 42;
-  o.SortMax = 500;
-  o.ConnectionString = "DSN=books";
-  o.DisplayName = "BOOKS";
-  o.BuildTime = {2024, 1, 2, 3, 4, 5, 6};
-  o.LastUpdateTime = {2024, 1, 2, 3, 4, 6, 0};
-  o.DateTimeKeyColumn = "changed";
-  o.MaxDateTimeKey = {2024, 3, 9, 14, 5, 7, 5};
-  o.GeneralFlags = 3;
-  o.IgnoreChars = u"-_";
-  o.UpdateFlags = 3;
+  o.KeyColumn = "id"; o.Count = 42; o.SortMax = 500; o.ConnectionString = "DSN=books";
+  o.DisplayName = "BOOKS"; o.BuildTime = {2024, 1, 2, 3, 4, 5, 6}; o.LastUpdateTime = {2024, 1, 2, 3, 4, 6, 0};
+  o.DateTimeKeyColumn = "changed"; o.MaxDateTimeKey = {2024, 3, 9, 14, 5, 7, 5};
+  o.GeneralFlags = 3; o.IgnoreChars = u"-_"; o.UpdateFlags = 3;
   return o;
 }
 
@@ -233,8 +202,8 @@ TEST_F(HeaderFile, OverLongDefinitionsAreRefusedBeforeWriting) {
 
   COrderInfo o = FullOrder();
   o.Columns.resize(400, OrderColumn{"column", {}});
-  EXPECT_FALSE(o.FitsHeaderBlock());
   file.OpenFile(Path("o.sri"), BFile::kCreate, 64);
+  EXPECT_FALSE(o.FitsHeaderBlock());
   EXPECT_THROW(o.WriteInfo(file), CHighStructuresException);
   EXPECT_EQ(file.BlockCount(), 0);
 }

@@ -84,7 +84,8 @@ void CBlock::Reset() {
 
 void CBlock::SetPosition(int32_t i) {
   RequireOpen("SetPosition");
-  cursor_ = i < 0 ? 0 : kHeaderBytes + 4 * i;
+  // Far positions stay far (every item there fails) instead of wrapping round.
+  cursor_ = i < 0 ? 0 : static_cast<int32_t>(std::min<int64_t>(kHeaderBytes + 4 * int64_t{i}, INT32_MAX));
 }
 
 void CBlock::LoadHeader() {

@@ -37,14 +37,6 @@ void DecodeRowsInPlace(int32_t* ints, std::size_t n) {
   }
 }
 
-void DecodeRows(const uint8_t* encoded, int32_t* ints, std::size_t n) {
-  if constexpr (kLittleEndianHost) {
-    if (n != 0) std::memcpy(ints, encoded, 4 * n);
-  } else {
-    for (std::size_t i = 0; i < n; ++i) ints[i] = bytes::LoadI32(encoded + 4 * i);
-  }
-}
-
 void WriteRows(MFile& file, const int32_t* ints, std::size_t n) {
   if (n == 0) return;
   if constexpr (kLittleEndianHost) {
@@ -380,19 +372,34 @@ void CItems::Load(const std::string& path, bool replace) {
   file.Close();
 }
 
+uint8_t* CItems::ReserveStoredRows(int32_t rows) {
+  if (rows < 0) throw CFreeItemException::General("CItems::AppendStoredRows");
+  const int64_t needed = int64_t{count_} + rows;
+  if (needed > capacity_ && !Reallocate(needed + growth_, true)) {
+    throw CFreeItemException::Text("Out of memory. Trying to reallocate %i bytes",
+                                   "CItems::AppendStoredRows", nullptr,
+                                   (needed + growth_) * RowSize());
+  }
+  return reinterpret_cast<uint8_t*>(data_.data() + static_cast<std::size_t>(count_) * width_);
+}
+
+int32_t CItems::TakeStoredRows(int32_t rows, std::size_t filled) {
+  const auto taken = static_cast<int32_t>(
+      std::min<std::size_t>(filled / static_cast<std::size_t>(RowSize()), static_cast<std::size_t>(rows)));
+  DecodeRowsInPlace(Row(count_), static_cast<std::size_t>(taken) * width_);
+  count_ += taken;
+  return taken;
+}
+
 void CItems::AppendEncodedRows(std::span<const uint8_t> encoded) {
   const auto row_size = static_cast<std::size_t>(RowSize());
   if (encoded.size() % row_size != 0 || encoded.size() / row_size > INT32_MAX) {
     throw CFreeItemException::General("CItems::AppendEncodedRows");
   }
-  const auto rows = static_cast<int64_t>(encoded.size() / row_size);
-  if (count_ + rows > capacity_ && !Reallocate(count_ + rows + growth_, true)) {
-    throw CFreeItemException::Text("Out of memory. Trying to reallocate %i bytes",
-                                   "CItems::AppendEncodedRows", nullptr,
-                                   (count_ + rows + growth_) * RowSize());
-  }
-  DecodeRows(encoded.data(), Row(count_), static_cast<std::size_t>(rows) * width_);
-  count_ += static_cast<int32_t>(rows);
+  AppendStoredRows(static_cast<int32_t>(encoded.size() / row_size), [&](uint8_t* target, std::size_t n) {
+    if (n != 0) std::memcpy(target, encoded.data(), n);
+    return n;
+  });
 }
 
 CItems CItems::Widen(const CColumnSet& other) const {

@@ -111,6 +111,14 @@ class CItems {
   void Load(const std::string& path, bool replace);
   // Appends whole rows given in the stored row encoding.
   void AppendEncodedRows(std::span<const uint8_t> encoded);
+  // Appends up to rows stored rows read straight into the array (one read of
+  // a posting range, no copy): read(bytes, n) fills up to n bytes and returns
+  // how many it filled; the whole rows among them are kept. Returns their number.
+  template <class Read>
+  int32_t AppendStoredRows(int32_t rows, Read&& read) {
+    uint8_t* target = ReserveStoredRows(rows);
+    return TakeStoredRows(rows, read(target, static_cast<std::size_t>(rows) * RowSize()));
+  }
 
   // --- derived arrays ---
   // A copy whose rows take this set merged with other (missing columns hold
@@ -131,6 +139,10 @@ class CItems {
   bool GrowFor(int32_t index);
   void RaiseCountTo(int32_t count);
   void ReadStored(MFile& file, bool replace, const char* method);
+  // Room for rows more rows; their bytes. TakeStoredRows decodes the whole
+  // rows among the bytes filled and counts them.
+  uint8_t* ReserveStoredRows(int32_t rows);
+  int32_t TakeStoredRows(int32_t rows, std::size_t filled);
   void CheckIndex(int32_t index, const char* method) const;
 
   CColumnSet set_;

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstring>
 #include <numeric>
 #include <random>
 #include <string>
@@ -212,6 +213,14 @@ TEST(StoredItems, CountThenRowsLittleEndianAndDamagedCounts) {
   EXPECT_EQ(back.GetItem(3, 0), 0x01020304);
   back.AppendEncodedRows(std::vector<uint8_t>{7, 0, 0, 0, 8, 0, 0, 0});
   EXPECT_EQ(AllRows(back).back(), (std::vector<int32_t>{7, 8}));
+  // A read that stops within a row keeps the whole rows only.
+  EXPECT_EQ(back.AppendStoredRows(2, [&](uint8_t* target, std::size_t n) {
+    EXPECT_EQ(n, 16u);
+    std::memcpy(target, stored.data() + 4, 12);
+    return std::size_t{12};
+  }), 1);
+  EXPECT_EQ(AllRows(back).back(), (std::vector<int32_t>{1, -2}));
+  EXPECT_EQ(back.Count(), 6);
 
   // Counts that do not fit the file are refused before anything is allocated
   // (under the lowered limit an allocation would report memory instead).
@@ -223,7 +232,7 @@ TEST(StoredItems, CountThenRowsLittleEndianAndDamagedCounts) {
     EXPECT_EQ(RaisedText<CFreeItemException>([&] { back.Load(bad, true); }),
               "Damaged item array " + bad + ": " + std::to_string(n) +
                   " rows of 8 bytes do not fit 20 bytes (Module:FreeItem,Method:CItems::Load)");
-    EXPECT_EQ(back.Count(), 5);
+    EXPECT_EQ(back.Count(), 6);
   }
   test::WriteFile(bad, "\1\0");
   EXPECT_THROW(back.Load(bad, true), CException);

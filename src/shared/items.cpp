@@ -287,11 +287,11 @@ const int32_t* CItems::RowAddress(int32_t index) const {
   return index >= 0 && index < count_ ? Row(index) : nullptr;
 }
 
-int CItems::CompareRow(int32_t index, const int32_t* key_row, std::span<const SortColumn> spec,
+int CItems::CompareRow(int32_t index, const int32_t* key_row, std::span<const SortColumn> sort_columns,
                        bool compare_key, bool key_descending) const {
   CheckIndex(index, "CItems::CompareRow");
   const int32_t* row = Row(index);
-  for (const SortColumn& c : spec) {
+  for (const SortColumn& c : sort_columns) {
     if (c.column < 0 || c.column >= width_) throw CFreeItemException::General("CItems::CompareRow");
     const int32_t a = row[c.column];
     const int32_t b = key_row[c.column];
@@ -302,11 +302,11 @@ int CItems::CompareRow(int32_t index, const int32_t* key_row, std::span<const So
 }
 
 int32_t CItems::FirstDifference(int32_t index, const int32_t* key_row,
-                                std::span<const SortColumn> spec) const {
+                                std::span<const SortColumn> sort_columns) const {
   CheckIndex(index, "CItems::FirstDifference");
   const int32_t* row = Row(index);
-  for (std::size_t i = 0; i < spec.size(); ++i) {
-    const int32_t column = spec[i].column;
+  for (std::size_t i = 0; i < sort_columns.size(); ++i) {
+    const int32_t column = sort_columns[i].column;
     if (column < 0 || column >= width_) {
       throw CFreeItemException::General("CItems::FirstDifference");
     }

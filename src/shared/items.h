@@ -92,11 +92,11 @@ class CItems {
   // The row at index against key_row by the sort columns in order (signed,
   // reversed for a descending column); when all agree and compare_key is set,
   // column 0 decides under key_descending. -1, 0 or 1.
-  int CompareRow(int32_t index, const int32_t* key_row, std::span<const SortColumn> spec,
+  int CompareRow(int32_t index, const int32_t* key_row, std::span<const SortColumn> sort_columns,
                  bool compare_key, bool key_descending) const;
   // The number of the first sort column whose values differ, or -1.
   int32_t FirstDifference(int32_t index, const int32_t* key_row,
-                          std::span<const SortColumn> spec) const;
+                          std::span<const SortColumn> sort_columns) const;
 
   // Ascending by key, signed. Rows with equal keys end in the reverse of
   // their order before the sort: a bottom-up merge that takes the later

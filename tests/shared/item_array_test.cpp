@@ -152,15 +152,15 @@ TEST(ItemArray, SortPutsTheLaterOfEqualKeysFirst) {
 
 TEST(ItemArray, CompareRowAndFirstDifference) {
   CItems items = Array(CColumnSet{1, 1, 0, 0}, {{10, 5, 7}});
-  const std::vector<SortColumn> spec = {{1, true}, {2, false}};
+  const std::vector<SortColumn> sort_columns = {{1, true}, {2, false}};
   const int32_t lower_score[] = {99, 4, 0}, same[] = {11, 5, 7}, later_position[] = {10, 5, 8};
-  EXPECT_EQ(items.CompareRow(0, lower_score, spec, false, false), -1);  // descending score
-  EXPECT_EQ(items.CompareRow(0, later_position, spec, false, false), -1);
-  EXPECT_EQ(items.CompareRow(0, same, spec, false, false), 0);
-  EXPECT_EQ(items.CompareRow(0, same, spec, true, false), -1);
-  EXPECT_EQ(items.CompareRow(0, same, spec, true, true), 1);
-  EXPECT_EQ(items.FirstDifference(0, later_position, spec), 1);
-  EXPECT_EQ(items.FirstDifference(0, same, spec), -1);
+  EXPECT_EQ(items.CompareRow(0, lower_score, sort_columns, false, false), -1);  // descending score
+  EXPECT_EQ(items.CompareRow(0, later_position, sort_columns, false, false), -1);
+  EXPECT_EQ(items.CompareRow(0, same, sort_columns, false, false), 0);
+  EXPECT_EQ(items.CompareRow(0, same, sort_columns, true, false), -1);
+  EXPECT_EQ(items.CompareRow(0, same, sort_columns, true, true), 1);
+  EXPECT_EQ(items.FirstDifference(0, later_position, sort_columns), 1);
+  EXPECT_EQ(items.FirstDifference(0, same, sort_columns), -1);
 }
 
 TEST(ItemArray, MergeWidenAndFillGaps) {

@@ -57,11 +57,24 @@ void BFile::CheckSize(const CBlock& block, const char* method) const {
 void BFile::ReadBlock(CBlock& block) {
   Guarded("ReadBlock", [&] {
     CheckSize(block, "ReadBlock");
+    const int64_t number = file_.Position() / block_size_;
     const auto size = static_cast<std::size_t>(block_size_);
-    if (file_.Read(block.Data(), size) != size) throw CBFileException::General("ReadBlock");
+    const std::size_t got = file_.Read(block.Data(), size);
+    if (got != size) {
+      block.SetUsed(CBlock::kHeaderBytes);  // the old contents are partly overwritten
+      block.SetCursor(CBlock::kHeaderBytes);
+      throw CBFileException::Text("Error reading block %i of %s: %i of %i bytes read", "ReadBlock",
+                                  nullptr, number, path_, got, size);
+    }
     block.LoadHeader();
-    // A used count beyond the block can only come from a damaged file.
-    if (block.GetUsed() > block_size_) throw CBFileException::General("ReadBlock");
+    block.SetOrigin(number, path_);
+    // A used count outside the block can only come from a damaged file.
+    if (block.GetUsed() < CBlock::kHeaderBytes || block.GetUsed() > block_size_) {
+      const int32_t used = block.GetUsed();
+      block.SetUsed(CBlock::kHeaderBytes);  // nothing of it can be trusted
+      throw CBFileException::Text("Damaged block %i of %s: used count %i", "ReadBlock", nullptr,
+                                  number, path_, used);
+    }
   });
 }
 

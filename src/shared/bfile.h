@@ -29,7 +29,9 @@ class BFile {
   int64_t BlockCount() const;
 
   // Each raises "Block size missmatch" when the block's size is not the
-  // file's. ReadBlock loads the block header; WriteBlock and AddBlock store
+  // file's. ReadBlock loads the block header and names the block as its
+  // origin; a short read or a used count outside 6..block size raises a
+  // message naming the block and leaves it empty. WriteBlock and AddBlock store
   // the used count first. The cursor ends at 6.
   void ReadBlock(CBlock& block);
   void WriteBlock(CBlock& block);

@@ -1,5 +1,6 @@
 // CIndexHeader: the definition and build statistics of one findex, as kept in
-// memory. The same fields, in this order, make up block 0 of the .sdx file.
+// memory. The same fields, in this order, make up block 0 of the .sdx file
+// (ReadInfo/WriteInfo; docs/formats.md has the byte layout).
 #pragma once
 
 #include <cstdint>
@@ -9,6 +10,8 @@
 #include "shared/value.h"
 
 namespace qm {
+
+class BFile;
 
 // The tags of one indexed column: tag name -> value (CONTENT_WEIGHT=3 ...).
 using TagMap = std::map<std::string, std::string>;
@@ -49,6 +52,22 @@ struct CIndexHeader {
   int32_t UpdateSupport = 0;
   int32_t LanguageFlags = 20;
   int32_t Language = 2;
+
+  // Reads block 0 of the file: the version must be 601..700 (checked before
+  // the later fields); the connection string is unscrambled. On failure the
+  // header keeps its contents and a "HighStructures" error is raised.
+  void ReadInfo(BFile& file);
+  // Writes every field into a fresh block stored as block 0, stamped with the
+  // engine's version (614, "6.14"); the connection string only when general
+  // flag 8 (save the connection) is set, scrambled. A header that does not fit
+  // the block is refused before anything is written.
+  void WriteInfo(BFile& file) const;
+  // The bytes block 0 would use for this header (its 6 header bytes included),
+  // and whether that fits: callers can refuse an over-long definition early.
+  int64_t EncodedSize() const;
+  bool FitsHeaderBlock() const;
+
+  bool operator==(const CIndexHeader&) const = default;
 
   // Back to the values of a fresh header, lists emptied.
   void Reset() { *this = CIndexHeader{}; }

@@ -1,5 +1,6 @@
 // COrderInfo: the definition and build statistics of one order, as kept in
-// memory. The same fields, in this order, make up block 0 of the .sri file.
+// memory. The same fields, in this order, make up block 0 of the .sri file
+// (ReadInfo/WriteInfo; docs/formats.md has the byte layout).
 #pragma once
 
 #include <array>
@@ -11,11 +12,15 @@
 
 namespace qm {
 
+class BFile;
+
 // One order column; the three values belong to the order builder and are
 // carried through unchanged.
 struct OrderColumn {
   std::string Name;
   std::array<int32_t, 3> BuilderValues{};
+
+  bool operator==(const OrderColumn&) const = default;
 };
 
 // The order columns in statement order (unlike a findex's column map).
@@ -43,6 +48,23 @@ struct COrderInfo {
   std::u16string IgnoreChars;    // ignored when comparing order values
   int32_t UpdateFlags = 0;       // bit 1 date/time key, bit 2 with fractions
   int32_t UpdateSupport = 0;     // in memory only: not part of block 0
+
+  // As CIndexHeader::ReadInfo; the version is the first field. UpdateSupport
+  // is not part of the file and stays.
+  void ReadInfo(BFile& file);
+  // As CIndexHeader::WriteInfo; the connection string is always written
+  // (scrambled): the order builder decides whether to set it.
+  void WriteInfo(BFile& file) const;
+  int64_t EncodedSize() const;
+  bool FitsHeaderBlock() const;
+
+  // The SELECT that reads the order's data: the SQL as a table, or the key
+  // and order columns of the table; with SortMax above 0 restricted to later
+  // rows, by the date/time key (update flag 1; "'" literals, or "#" ones
+  // with date_style) or by the key.
+  std::string GetSelectDataSQL(bool date_style) const;
+
+  bool operator==(const COrderInfo&) const = default;
 
   void Reset() { *this = COrderInfo{}; }
 

@@ -1,6 +1,7 @@
 #include "shared/sql_time.h"
 
 #include <algorithm>
+#include <cstdio>
 
 namespace qm {
 
@@ -28,6 +29,18 @@ std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction) {
     s += "." + digits;
   }
   return s;
+}
+
+std::string SQLTimeToSqlLiteral(const DateTimeValue& time, bool with_fraction) {
+  char text[64];
+  int n = std::snprintf(text, sizeof text, "%04d-%02u-%02u %02u:%02u:%02u", int{time.year},
+                        unsigned{time.month}, unsigned{time.day}, unsigned{time.hour},
+                        unsigned{time.minute}, unsigned{time.second});
+  if (with_fraction && n > 0) {
+    std::snprintf(text + n, sizeof text - static_cast<std::size_t>(n), ".%09u",
+                  static_cast<unsigned>(time.fraction));
+  }
+  return text;
 }
 
 }  // namespace qm

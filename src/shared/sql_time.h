@@ -16,4 +16,8 @@ DateTimeValue SystemTimeToSQLTime(const platform::LocalTime& time);
 // so the text reads back as the same time.
 std::string SQLTimeToString(const DateTimeValue& time, bool with_fraction = false);
 
+// The form for date literals inside SQL: "2024-03-09 14:05:07", zero-padded,
+// then "." and the fraction as 9 digits of nanoseconds when asked for.
+std::string SQLTimeToSqlLiteral(const DateTimeValue& time, bool with_fraction = false);
+
 }  // namespace qm

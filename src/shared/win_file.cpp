@@ -69,6 +69,12 @@ void WinFile::SeekToEnd() {
   }
 }
 
+int64_t WinFile::Position() const {
+  const int64_t position = platform::SeekFile(handle_.Get(), 0, platform::SeekFrom::Current);
+  if (position < 0) throw CWinFileException::General("Position");
+  return position;
+}
+
 int64_t WinFile::Size() const {
   const int64_t size = platform::FileSize(handle_.Get());
   if (size < 0) throw CWinFileException::General("Size");

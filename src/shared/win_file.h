@@ -34,6 +34,7 @@ class WinFile {
   void WriteAt(const void* data, std::size_t n, int64_t offset);
   void Seek(int64_t position);
   void SeekToEnd();
+  int64_t Position() const;
   int64_t Size() const;
   void Close();
 

@@ -92,7 +92,8 @@ TEST_F(BFileTest, BlocksRoundTripWithTheirUsedCountAndLinkWords) {
   EXPECT_EQ(block.GetUsed(), 4096);
   file.ReadBlock(block);
   EXPECT_EQ(RaisedText<CBFileException>([&] { file.ReadBlock(block); }),
-            "General Error (Module:BFile,Method:ReadBlock)");
+            "Error reading block 3 of " + Path("tree") +
+                ": 0 of 4096 bytes read (Module:BFile,Method:ReadBlock)");
 }
 
 TEST_F(BFileTest, ModesSizesAndDamage) {
@@ -113,12 +114,17 @@ TEST_F(BFileTest, ModesSizesAndDamage) {
   EXPECT_EQ(RaisedText<CBFileException>([&] { file.AddBlock(half); }), mismatch + "addblock)");
   EXPECT_EQ(file.BlockCount(), 0);
 
-  CBlock block(64);  // a used count beyond the block is damage
+  CBlock block(64);  // a used count outside 6..block size is damage
   block.SetUsed(5000);
+  file.AddBlock(block);
+  block.SetUsed(5);
   file.AddBlock(block);
   file.SeekToBlock(0);
   EXPECT_EQ(RaisedText<CBFileException>([&] { file.ReadBlock(block); }),
-            "General Error (Module:BFile,Method:ReadBlock)");
+            "Damaged block 0 of " + Path("i") + ": used count 5000 (Module:BFile,Method:ReadBlock)");
+  EXPECT_EQ(block.GetUsed(), 6);  // nothing of it is trusted
+  EXPECT_EQ(RaisedText<CBFileException>([&] { file.ReadBlock(block); }),
+            "Damaged block 1 of " + Path("i") + ": used count 5 (Module:BFile,Method:ReadBlock)");
 }
 
 }  // namespace

@@ -1,0 +1,35 @@
+// CPiSort: the first half of a findex build. Reads the rows of a definition's
+// SELECT, turns every column value into index entries and sorts them on disk.
+//
+// Contract between the word sort and the findex writer: an entry of the
+// sorted file is an item row (key; weight with score support; position with
+// phrase support: the CColumnSet of the definition's general flags) followed
+// by the value in the findex type's MFile encoding (text: 16-bit length then
+// UTF-8 bytes for an ANSI findex or UTF-16 units for a Unicode one; integer 4
+// bytes; double 8; date/time 16). Entries come by value, then key, stably.
+#pragma once
+
+#include <cstdint>
+
+#include "shared/global_defs.h"
+#include "shared/index_header.h"
+#include "shared/mfile.h"
+
+namespace qm {
+
+class CPiSort {
+ public:
+  explicit CPiSort(CGlobalDefs& defs);
+
+  // Selects, writes and sorts. On return sorted is open for reading at its
+  // start (a delete-on-close temporary file) and definition holds what the
+  // rows gave: FindexType, SortMax, KeyCount (rows read), MaxDateTimeKey,
+  // BuildTime and LastUpdateTime. Progress goes to the settings: 5, 15, 20,
+  // then 20 + (70 div n) x n per merge pass. No row raises error 47.
+  void SortFindexTable(CIndexHeader& definition, MFile& sorted);
+
+ private:
+  CGlobalDefs& defs_;
+};
+
+}  // namespace qm

@@ -2,8 +2,10 @@
 // progress and errors, the group and data path rules, connections,
 // pass-through SQL, and names that must never reach a file path.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <chrono>
+#include <cstdlib>
 #include <filesystem>
 #include <thread>
 
@@ -130,6 +132,27 @@ TEST_F(CommandEngineTest, CreateIndexGoesToTheDataSource) {
   // A second index of the same name is the data source's error.
   EXPECT_TRUE(Contains(Run("CREATE INDEX books_title ON books (title)"), "books_title"));
   EXPECT_FALSE(Run("CREATE INDEX broken ON no_table (x)").empty());
+}
+
+TEST_F(CommandEngineTest, PostgreSQLConnectionsAndCreateIndex) {
+  for (const char* variable : {"QM_TEST_PG_ANSI", "QM_TEST_PG_UNICODE"}) {
+    const char* connection = std::getenv(variable);
+    if (connection == nullptr || *connection == '\0') GTEST_SKIP() << variable << " is not set";
+    const std::string table = "engine_books_" + std::to_string(getpid());
+    CGlobalDefs defs;
+    defs.SetConnectionString(connection, "pg");
+    CShareDatabase database(defs);
+    database.Connect();
+    int16_t columns = 0;
+    database.ExecuteSql("create table " + table + " (id integer, title varchar(80))", columns);
+
+    EXPECT_EQ(Run(std::string("SET CONNECTIONSTRING \"") + connection + "\""), "") << variable;
+    const std::string create = "CREATE INDEX " + table + "_title ON " + table + " (title)";
+    EXPECT_EQ(Run(create), "");
+    EXPECT_TRUE(Contains(Run(create), "already exists")) << "the index is there";
+    database.ExecuteSql("drop table " + table, columns);
+    database.Disconnect();
+  }
 }
 
 TEST_F(CommandEngineTest, NamesThatCouldLeaveTheirFolderAreRefused) {

@@ -60,6 +60,27 @@ TEST_F(CommandEngineTest, BackgroundJobIsVisibleBeforeExecuteReturnsAndReportsOn
   EXPECT_EQ(ErrorMsg(), "");
 }
 
+TEST_F(CommandEngineTest, AnEndingJobLeavesTheProgressOfALaterOne) {
+  CLockManager first(CommandLockName(kCmdFindexStored, "FIRST"));
+  CLockManager second(CommandLockName(kCmdFindexStored, "SECOND"));
+  first.LockWriter();
+  second.LockWriter();
+  ASSERT_EQ(command_->Execute(T("UPDATE FINDEX First")), S_OK);
+  ASSERT_EQ(command_->Execute(T("UPDATE FINDEX Second")), S_OK);
+  first.UnlockWriter();
+  // The first job fails (no such findex); the second still runs and is shown.
+  for (int i = 0; i < 60000 && ErrorNumber() == 0; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  ASSERT_EQ(ErrorNumber(), 1);
+  for (int i = 0; i < 50; ++i) {
+    ASSERT_EQ(Progress(), 0);
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  second.UnlockWriter();
+  WaitForJob();
+}
+
 TEST_F(CommandEngineTest, BackgroundTranslationErrorsAndConcurrentJobs) {
   ASSERT_EQ(command_->Execute(T("CREATE FINDEX Books ON TABLE t COLUMNS a KEY")), S_OK);
   WaitForJob();

@@ -138,8 +138,8 @@ class APICommand {
   template <class Body>
   HRESULT Invoke(Body&& body);
 
-  std::string server_name_ = "LOCALHOST";
-  int32_t connected_ = 0;
+  // The server name and connected flag of the remote mode join the engine
+  // when remote access is built; every call is local until then.
   std::unique_ptr<Engine> engine_;
 };
 

@@ -3,10 +3,8 @@
 //   deleted_key_worker DATA_DIR GROUP FINDEX delete FIRST STEP COUNT
 //     deletes FIRST + i x STEP for i = COUNT-1 down to 0.
 //   deleted_key_worker DATA_DIR GROUP FINDEX read STOP_FILE
-//     reads the list in a loop until STOP_FILE exists, then once more; each
-//     time through ReadDeletedKeys and as raw bytes under its own kind 1 reader
-//     lock, checked here without the engine's decoder: the size matches the
-//     count, keys ascend strictly, and no key read before ever disappears.
+//     reads the list with ReadDeletedKeys in a loop until STOP_FILE exists,
+//     then once more; a torn list raises, and no key read before may vanish.
 //     Prints "reads N final K" (K keys at the last read). Gives up after
 //     kMaxReads reads without a stop file.
 //   deleted_key_worker DATA_DIR GROUP FINDEX delete-limited BYTES KEY
@@ -20,17 +18,13 @@
 #include <cstdint>
 #include <cstdlib>
 #include <filesystem>
-#include <fstream>
 #include <iostream>
-#include <iterator>
 #include <set>
 #include <string>
 #include <thread>
-#include <utility>
 #include <vector>
 
 #include "build/deleted_keys.h"
-#include "locks/lock_manager.h"
 #include "shared/exception.h"
 #include "shared/global_defs.h"
 
@@ -43,29 +37,7 @@ int Fail(const std::string& why) {
   return 1;
 }
 
-std::vector<int32_t> RawKeys(const std::string& path, std::string& fault) {
-  std::ifstream in(path, std::ios::binary);
-  const std::string bytes((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-  if (!in.is_open() && !std::filesystem::exists(path)) return {};
-  auto word = [&](std::size_t at) {
-    uint32_t v = 0;
-    for (int i = 3; i >= 0; --i) v = (v << 8) | static_cast<unsigned char>(bytes[at + i]);
-    return static_cast<int32_t>(v);
-  };
-  std::vector<int32_t> keys;
-  if (bytes.size() < 4 || word(0) < 0 || bytes.size() != 4 + 4 * std::size_t(word(0))) {
-    fault = "torn file of " + std::to_string(bytes.size()) + " bytes";
-    return keys;
-  }
-  for (std::size_t at = 4; at < bytes.size(); at += 4) {
-    if (!keys.empty() && word(at) <= keys.back()) fault = "keys out of order";
-    keys.push_back(word(at));
-  }
-  return keys;
-}
-
 int Read(const qm::CGlobalDefs& defs, const std::string& findex, const std::string& stop) {
-  const std::string path = qm::DeletedKeysPath(defs, findex);
   std::set<int32_t> seen;
   long reads = 0;
   for (bool last = false; !last;) {
@@ -73,24 +45,14 @@ int Read(const qm::CGlobalDefs& defs, const std::string& findex, const std::stri
     if (reads == kMaxReads) return Fail("no stop file after " + std::to_string(reads) + " reads");
     // Leaves the deleters room to take every reader unit now and then.
     if (reads > 0) std::this_thread::sleep_for(std::chrono::microseconds(200));
-    std::string fault;
-    std::vector<int32_t> raw;
-    {
-      qm::CLockManager lock(defs.GetGroup(), findex, qm::kLockDeletedKeys);
-      lock.LockReader();
-      raw = RawKeys(path, fault);
-    }
-    if (!fault.empty()) return Fail(fault);
     const std::vector<int32_t> keys = qm::ReadDeletedKeys(defs, findex);
     ++reads;
     // Deletes only add: whatever was seen before must still be there.
-    for (const std::vector<int32_t>* list : {&std::as_const(raw), &keys}) {
-      const std::set<int32_t> now(list->begin(), list->end());
-      for (int32_t k : seen) {
-        if (!now.count(k)) return Fail("key " + std::to_string(k) + " disappeared");
-      }
+    const std::set<int32_t> now(keys.begin(), keys.end());
+    for (int32_t k : seen) {
+      if (!now.count(k)) return Fail("key " + std::to_string(k) + " disappeared");
     }
-    seen.insert(keys.begin(), keys.end());
+    seen = now;
     if (last) std::cout << "reads " << reads << " final " << keys.size() << std::endl;
   }
   return 0;

@@ -3,6 +3,7 @@
 #include "build/command_locks.h"
 #include "build/command_translator.h"
 #include "build/command_type.h"
+#include "build/deleted_keys.h"
 #include "build/findex_files.h"
 #include "build/findex_writer.h"
 #include "locks/lock_manager.h"
@@ -33,14 +34,11 @@ constexpr int64_t kHeaderBlockLimit = 4095;
 // The general option bits an update cannot add to a findex built without them.
 constexpr int32_t kPostingLayoutBits = kIgoSupportScore | kIgoSupportPhrases;
 
-// The order builder and the deleted-key writer come with their own parts of
-// the engine; until then these commands are refused with these texts.
+// The order builder comes with its own part of the engine; until then the
+// order commands are refused with this text.
 constexpr std::string_view kOrdersNotAvailable =
     "Orders are not available in this build of Quillmere Search: CREATE ORDER, UPDATE ORDER, "
     "DROP ORDER and CreateOrder need the order builder, which is not part of it";
-constexpr std::string_view kDeletesNotAvailable =
-    "Deleting keys is not available in this build of Quillmere Search: DELETE FROM FINDEX "
-    "needs the deleted-key file writer, which is not part of it";
 
 // Holds one per-command writer lock for a scope.
 class CommandLock {
@@ -295,9 +293,13 @@ void CommandExecution::DeleteKey(const Command& command) {
   const std::string& name = command.findex.IndexName;
   RequirePlainName<CPiStartPointException>("findex", name, kExecuteW);
   const CommandLock lock(kCmdDeleteKey, name);
-  // The deleted-key writer (DeleteKey with synchronise true) is called here
-  // once it is part of the engine.
-  throw CPiStartPointException::Text(kDeletesNotAvailable, kExecuteW, nullptr);
+  // A key deleted from a findex that is not there would be reported done
+  // while no search ever subtracts it.
+  if (!FindexFilesExist(defs_, name)) {
+    throw CPiStartPointException::Text("Cannot delete key %i: findex %s does not exist", kExecuteW,
+                                       nullptr, command.delete_key, name);
+  }
+  qm::DeleteKey(defs_, name, command.delete_key, true);
 }
 
 void CommandExecution::RunPassThroughSql(const Command& command) {

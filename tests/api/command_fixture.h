@@ -109,6 +109,13 @@ class CommandFixture : public ::testing::Test {
     database.Disconnect();
   }
 
+  // Settings on the test's data directory and the PUBLIC group.
+  CGlobalDefs Defs() const {
+    CGlobalDefs defs;
+    defs.SetDataPath(home_.Data());
+    return defs;
+  }
+
   // Every trace line written so far, all modules.
   std::string TraceText() const {
     std::string all;

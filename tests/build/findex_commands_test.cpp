@@ -11,6 +11,7 @@
 #include "api/command_fixture.h"
 #include "build/command_locks.h"
 #include "build/command_type.h"
+#include "build/deleted_keys.h"
 #include "locks/lock_manager.h"
 #include "shared/bfile.h"
 #include "shared/index_header.h"
@@ -268,6 +269,18 @@ TEST_F(FindexCommandsTest, UpdateCannotAddScoreOrPhrasesTheFindexWasBuiltWithout
   // So does CREATE from the stored definition: a rebuild reads every row.
   Run("CREATE FINDEX Books");
   EXPECT_TRUE(Traced("Status 2. IndexBuildName: Books, Rebuild: 1, SortMax: 0"));
+}
+
+TEST_F(FindexCommandsTest, DeletedKeysGoToTheFindexsDeletedKeyFile) {
+  WriteFindex("BOOKS", Books(1, 1));
+  for (const char* statement : {"DELETE FROM FINDEX Books 30", "DELETE FROM FINDEX books 10",
+                                "DELETE FROM FINDEX BOOKS -20", "DELETE FROM FINDEX Books 10"}) {
+    EXPECT_EQ(Run(statement), "") << statement;
+  }
+  EXPECT_EQ(ReadDeletedKeys(Defs(), "Books"), (std::vector<int32_t>{-20, 10, 30}));
+  const std::string text = Run("DELETE FROM FINDEX Bokks 5");
+  EXPECT_EQ(text.rfind("Cannot delete key 5: findex Bokks does not exist", 0), 0u) << text;
+  EXPECT_FALSE(fs::exists(IndexFolder() + "BOKKS.del"));
 }
 
 TEST_F(FindexCommandsTest, DropRemovesTheFindexWithItsAddOnsAndDeletedKeys) {

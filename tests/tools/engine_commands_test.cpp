@@ -3,10 +3,13 @@
 // that last from one invocation to the next.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <string>
 #include <vector>
 
+#include "shared/global_defs.h"
+#include "sources/share_database.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -117,6 +120,41 @@ TEST_F(EngineCommandsTest, EngineErrorsGoToStandardErrorAndExitOne) {
   r = Host({"--group", "Nowhere", "exec", "SET GROUP Nowhere"});
   EXPECT_EQ(r.status, 1);
   EXPECT_NE(r.err.find("group folder does not exist"), std::string::npos) << r.err;
+}
+
+TEST_F(EngineCommandsTest, ExecBuildsAFindexThatInfoExistsAndDropSee) {
+  ASSERT_EQ(Host({"init"}).status, 0);  // the language data the build needs
+  const std::string database = dir_.Path() + "books.db";
+  const std::string connect = "Driver=SQLite3;Database=" + database + ";StepAPI=1;";
+  {
+    CGlobalDefs defs;
+    defs.SetConnectionString(connect, "books");
+    CShareDatabase db(defs);
+    db.Connect();
+    int16_t columns = 0;
+    db.ExecuteSql("create table books (id integer, title varchar(50))", columns);
+    db.ExecuteSql("insert into books values (1, 'River fish'), (2, 'Mountain')", columns);
+    db.Disconnect();
+  }
+  Result r = Host({"--connect", connect, "exec", "--background",
+                   "CREATE FINDEX Books ON TABLE books COLUMNS title KEY id"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_EQ(r.out.substr(r.out.size() - 5), "100%\n") << r.out;
+
+  r = Host({"info", "findex", "Books"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  for (const char* line : {"idxTableName\tbooks\n", "idxColumnNames\ttitle\n", "idxKeyName\tid\n",
+                           "idxTypeName\tText (Ansi)\n", "idxWordCount\t3\n", "idxKeyCount\t2\n",
+                           "idxFracmentationLevel\t0\n", "idxIndexStartValue\t\n"}) {
+    EXPECT_NE(r.out.find(line), std::string::npos) << line << r.out;
+  }
+  EXPECT_EQ(std::count(r.out.begin(), r.out.end(), '\n'), 18);
+
+  EXPECT_EQ(Host({"exists", "books"}).out, "yes\n");
+  r = Host({"options", "get", "index-general", "--stored", "Books"});
+  EXPECT_NE(r.out.find("igoSupportPhrases\t1\n"), std::string::npos) << r.err;
+  EXPECT_EQ(Host({"drop", "findex", "Books"}).status, 0);
+  EXPECT_EQ(Host({"exists", "Books"}).out, "no\n");
 }
 
 TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {

@@ -1,0 +1,217 @@
+#include "build/entry_sort.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <new>
+#include <system_error>
+
+#include "shared/checked_allocation.h"
+#include "shared/exception_family.h"
+#include "shared/global_defs.h"
+#include "shared/temp_names.h"
+#include "shared/trace.h"
+
+namespace qm {
+
+namespace {
+
+// The caller number in the temporary names of the sort files.
+constexpr int32_t kSortFileCaller = 44;
+constexpr int32_t kAllocationFailed = 11;
+// Room reserved per array entry at first; the arena grows past it for long text.
+constexpr std::size_t kFirstBytesPerEntry = 32;
+
+}  // namespace
+
+CEntrySort::CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module)
+    : defs_(defs), layout_(layout), module_(module) {}
+
+const char* CEntrySort::TraceTag() const {
+  return module_ == Module::PiSort ? "PILIB.PiSort.SortFindexTable" : "PILIB.PiOrderSort.Sort";
+}
+
+void CEntrySort::RaiseAllocationFailure() {
+  FreeRowArrays();
+  if (module_ == Module::PiSort) {
+    throw CPiSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+  }
+  throw CPiOrderSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+}
+
+void CEntrySort::AllocateRowArrays() {
+  try {
+    ReserveChecked(entries_a_, kArrayEntries);
+    ReserveChecked(entries_b_, kArrayEntries);
+    ReserveChecked(arena_, kArrayEntries * std::max(kFirstBytesPerEntry, layout_.FixedSize()));
+  } catch (const std::bad_alloc&) {
+    RaiseAllocationFailure();
+  }
+}
+
+void CEntrySort::FreeRowArrays() {
+  std::vector<uint8_t>().swap(arena_);
+  std::vector<uint32_t>().swap(entries_a_);
+  std::vector<uint32_t>().swap(entries_b_);
+}
+
+void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
+  const std::string path = SLGetTempWorkFilePath(defs, kSortFileCaller);
+  try {
+    file.OpenFile(path, MFile::kCreate, platform::kFileAttributeDeleteOnClose);
+  } catch (...) {
+    // The name was created for us; without an open file nothing else removes it.
+    std::error_code ignored;
+    std::filesystem::remove(path, ignored);
+    throw;
+  }
+}
+
+// Bottom-up merge sort of the offsets in entries_a_, stable: on equal entries
+// the left one goes first. The result ends in entries_a_.
+void CEntrySort::SortArray() {
+  const std::size_t n = entries_a_.size();
+  entries_b_.resize(n);
+  uint32_t* from = entries_a_.data();
+  uint32_t* to = entries_b_.data();
+  const uint8_t* base = arena_.data();
+  for (std::size_t width = 1; width < n; width *= 2) {
+    for (std::size_t left = 0; left < n; left += 2 * width) {
+      const std::size_t mid = std::min(left + width, n);
+      const std::size_t right = std::min(left + 2 * width, n);
+      std::size_t i = left;
+      std::size_t j = mid;
+      std::size_t k = left;
+      while (i < mid && j < right) {
+        // The right entry goes first only when strictly smaller.
+        if (layout_.Compare(base + from[j], base + from[i]) < 0) {
+          to[k++] = from[j++];
+        } else {
+          to[k++] = from[i++];
+        }
+      }
+      while (i < mid) to[k++] = from[i++];
+      while (j < right) to[k++] = from[j++];
+    }
+    std::swap(from, to);
+  }
+  if (from != entries_a_.data()) std::copy(from, from + n, entries_a_.data());
+}
+
+void CEntrySort::WriteRun(MFile& out) {
+  const uint8_t* base = arena_.data();
+  for (const uint32_t offset : entries_a_) {
+    out.mwrite(base + offset, layout_.SizeOf(base + offset));
+  }
+}
+
+void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
+  raw.Seek(0);
+  int64_t traced = 0;
+  for (bool more = true; more;) {
+    arena_.clear();
+    entries_a_.clear();
+    while (entries_a_.size() < kArrayEntries) {
+      const std::size_t offset = arena_.size();
+      if (!layout_.Read(raw, arena_)) {
+        more = false;
+        break;
+      }
+      entries_a_.push_back(static_cast<uint32_t>(offset));
+    }
+    if (entries_a_.empty()) break;
+    SortArray();
+    WriteRun(runs[level_one_runs_ % 2]);
+    ++level_one_runs_;
+    sorted_entries_ += static_cast<int64_t>(entries_a_.size());
+    if (sorted_entries_ - traced >= kSortedTraceStep) {
+      traced = sorted_entries_;
+      Trace(defs_.TraceLevel2(), TraceTag(), "Words Sorted: %i", sorted_entries_);
+    }
+  }
+}
+
+int64_t CEntrySort::MergePass(MFile* in, MFile* out, int64_t run_length) {
+  // Per input: an entry waiting in current_, entries left in its run, the end.
+  bool loaded[2] = {false, false};
+  bool ended[2] = {false, false};
+  int64_t left[2] = {0, 0};
+  auto ready = [&](int i) {
+    if (loaded[i]) return true;
+    if (left[i] == 0 || ended[i]) return false;
+    current_[i].clear();
+    if (!layout_.Read(in[i], current_[i])) {
+      ended[i] = true;
+      return false;
+    }
+    loaded[i] = true;
+    --left[i];
+    return true;
+  };
+
+  int64_t runs = 0;
+  for (;;) {
+    left[0] = left[1] = run_length;
+    MFile& target = out[runs % 2];
+    bool wrote = false;
+    for (;;) {
+      const bool a = ready(0);
+      const bool b = ready(1);
+      if (!a && !b) break;
+      // The second input goes first only when strictly smaller.
+      const int take = (b && (!a || layout_.Compare(current_[1].data(), current_[0].data()) < 0)) ? 1 : 0;
+      target.mwrite(current_[take].data(), current_[take].size());
+      loaded[take] = false;
+      wrote = true;
+    }
+    if (!wrote) break;
+    ++runs;
+  }
+  return runs;
+}
+
+void CEntrySort::Sort(MFile& raw, MFile& sorted) {
+  sorted_entries_ = 0;
+  level_one_runs_ = 0;
+  passes_ = 0;
+  MFile level_one[2];
+  OpenSortFile(defs_, level_one[0]);
+  OpenSortFile(defs_, level_one[1]);
+
+  AllocateRowArrays();
+  try {
+    LevelOne(raw, level_one);
+  } catch (const std::bad_alloc&) {
+    RaiseAllocationFailure();
+  }
+  defs_.SetProgress(20);
+  FreeRowArrays();
+  raw.Close();
+
+  MFile level_two[2];
+  OpenSortFile(defs_, level_two[0]);
+  OpenSortFile(defs_, level_two[1]);
+  MFile* in = level_one;
+  MFile* out = level_two;
+  in[0].Seek(0);
+  in[1].Seek(0);
+  for (int64_t run_length = kArrayEntries;; run_length *= 2) {
+    const int64_t runs = MergePass(in, out, run_length);
+    ++passes_;
+    Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i", runs);
+    const int64_t n = std::max<int64_t>(runs, 1);
+    defs_.SetProgress(static_cast<int32_t>(20 + (70 / n) * n));
+    if (runs <= 1) break;
+    std::swap(in, out);
+    // Inputs of the next pass are read from their start; its outputs start empty.
+    for (int i = 0; i < 2; ++i) {
+      in[i].Seek(0);
+      out[i].Truncate(0);
+    }
+  }
+  // The one run (or none) went to the first output.
+  out[0].Seek(0);
+  sorted.TakeOver(out[0]);
+  sorted.Seek(0);
+}
+
+}  // namespace qm

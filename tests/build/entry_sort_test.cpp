@@ -118,7 +118,7 @@ TEST_F(EntrySortTest, EveryTypeSortsByValueThenKeyStablyAcrossMergePasses) {
                           VALUE_TYPE::Double, VALUE_TYPE::DateTime}) {
     SCOPED_TRACE(static_cast<int>(type));
     CEntrySort sort(home_.Defs(), SortEntryLayout(2, type), CEntrySort::Module::PiSort);
-    test::ExpectSortedAndStable(SortRandom(type, 40000, &sort));
+    test::ExpectSortedAndStable(SortRandom(type, 40000, &sort), 1);
     EXPECT_EQ(sort.LevelOneRuns(), 5);
     EXPECT_EQ(sort.MergePasses(), 3);
     EXPECT_EQ(sort.EntriesSorted(), 40000);
@@ -134,7 +134,7 @@ TEST_F(EntrySortTest, EveryTypeSortsByValueThenKeyStablyAcrossMergePasses) {
 TEST_F(EntrySortTest, OneArrayMakesOneRunAndOnePassAndNothingMakesAnEmptyFile) {
   CEntrySort sort(home_.Defs(), SortEntryLayout(2, VALUE_TYPE::AsciiString),
                   CEntrySort::Module::PiSort);
-  test::ExpectSortedAndStable(SortRandom(VALUE_TYPE::AsciiString, 8192, &sort));
+  test::ExpectSortedAndStable(SortRandom(VALUE_TYPE::AsciiString, 8192, &sort), 1);
   EXPECT_EQ(sort.LevelOneRuns(), 1);
   EXPECT_EQ(sort.MergePasses(), 1);
   EXPECT_EQ(TurnsLeft(), std::vector<std::string>{"1"});

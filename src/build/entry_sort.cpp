@@ -43,6 +43,7 @@ void CEntrySort::AllocateRowArrays() {
     ReserveChecked(entries_a_, kArrayEntries);
     ReserveChecked(entries_b_, kArrayEntries);
     ReserveChecked(arena_, kArrayEntries * std::max(kFirstBytesPerEntry, layout_.FixedSize()));
+    arena_.resize(arena_.capacity());  // entries are read into it, not appended
   } catch (const std::bad_alloc&) {
     RaiseAllocationFailure();
   }
@@ -66,14 +67,14 @@ void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
   }
 }
 
-// Bottom-up merge sort of the offsets in entries_a_, stable: on equal entries
-// the left one goes first. The result ends in entries_a_.
-void CEntrySort::SortArray() {
-  const std::size_t n = entries_a_.size();
-  entries_b_.resize(n);
-  uint32_t* from = entries_a_.data();
-  uint32_t* to = entries_b_.data();
-  const uint8_t* base = arena_.data();
+namespace {
+
+// Bottom-up merge sort of offsets into base, stable: on equal entries the
+// left one goes first. from and to hold n offsets each; returns the array
+// that holds the result.
+template <class Compare>
+uint32_t* MergeSortOffsets(const uint8_t* base, uint32_t* from, uint32_t* to, std::size_t n,
+                           Compare compare) {
   for (std::size_t width = 1; width < n; width *= 2) {
     for (std::size_t left = 0; left < n; left += 2 * width) {
       const std::size_t mid = std::min(left + width, n);
@@ -83,18 +84,25 @@ void CEntrySort::SortArray() {
       std::size_t k = left;
       while (i < mid && j < right) {
         // The right entry goes first only when strictly smaller.
-        if (layout_.Compare(base + from[j], base + from[i]) < 0) {
-          to[k++] = from[j++];
-        } else {
-          to[k++] = from[i++];
-        }
+        to[k++] = compare(base + from[j], base + from[i]) < 0 ? from[j++] : from[i++];
       }
       while (i < mid) to[k++] = from[i++];
       while (j < right) to[k++] = from[j++];
     }
     std::swap(from, to);
   }
-  if (from != entries_a_.data()) std::copy(from, from + n, entries_a_.data());
+  return from;
+}
+
+}  // namespace
+
+void CEntrySort::SortArray() {
+  const std::size_t n = entries_a_.size();
+  entries_b_.resize(n);
+  const uint32_t* result = layout_.WithComparison([&](auto compare) {
+    return MergeSortOffsets(arena_.data(), entries_a_.data(), entries_b_.data(), n, compare);
+  });
+  if (result != entries_a_.data()) std::copy(result, result + n, entries_a_.data());
 }
 
 void CEntrySort::WriteRun(MFile& out) {
@@ -108,15 +116,16 @@ void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
   raw.Seek(0);
   int64_t traced = 0;
   for (bool more = true; more;) {
-    arena_.clear();
+    std::size_t filled = 0;
     entries_a_.clear();
     while (entries_a_.size() < kArrayEntries) {
-      const std::size_t offset = arena_.size();
-      if (!layout_.Read(raw, arena_)) {
+      const std::size_t size = layout_.Read(raw, arena_, filled);
+      if (size == 0) {
         more = false;
         break;
       }
-      entries_a_.push_back(static_cast<uint32_t>(offset));
+      entries_a_.push_back(static_cast<uint32_t>(filled));
+      filled += size;
     }
     if (entries_a_.empty()) break;
     SortArray();
@@ -131,42 +140,44 @@ void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
 }
 
 int64_t CEntrySort::MergePass(MFile* in, MFile* out, int64_t run_length) {
-  // Per input: an entry waiting in current_, entries left in its run, the end.
-  bool loaded[2] = {false, false};
-  bool ended[2] = {false, false};
-  int64_t left[2] = {0, 0};
-  auto ready = [&](int i) {
-    if (loaded[i]) return true;
-    if (left[i] == 0 || ended[i]) return false;
-    current_[i].clear();
-    if (!layout_.Read(in[i], current_[i])) {
-      ended[i] = true;
-      return false;
-    }
-    loaded[i] = true;
-    --left[i];
-    return true;
-  };
+  return layout_.WithComparison([&](auto compare) {
+    // Per input: the size of the entry waiting in current_ (0: none), entries
+    // left in its run, the end of its file.
+    std::size_t loaded[2] = {0, 0};
+    bool ended[2] = {false, false};
+    int64_t left[2] = {0, 0};
+    auto ready = [&](int i) {
+      if (loaded[i] != 0) return true;
+      if (left[i] == 0 || ended[i]) return false;
+      loaded[i] = layout_.Read(in[i], current_[i], 0);
+      if (loaded[i] == 0) {
+        ended[i] = true;
+        return false;
+      }
+      --left[i];
+      return true;
+    };
 
-  int64_t runs = 0;
-  for (;;) {
-    left[0] = left[1] = run_length;
-    MFile& target = out[runs % 2];
-    bool wrote = false;
+    int64_t runs = 0;
     for (;;) {
-      const bool a = ready(0);
-      const bool b = ready(1);
-      if (!a && !b) break;
-      // The second input goes first only when strictly smaller.
-      const int take = (b && (!a || layout_.Compare(current_[1].data(), current_[0].data()) < 0)) ? 1 : 0;
-      target.mwrite(current_[take].data(), current_[take].size());
-      loaded[take] = false;
-      wrote = true;
+      left[0] = left[1] = run_length;
+      MFile& target = out[runs % 2];
+      bool wrote = false;
+      for (;;) {
+        const bool a = ready(0);
+        const bool b = ready(1);
+        if (!a && !b) break;
+        // The second input goes first only when strictly smaller.
+        const int take = (b && (!a || compare(current_[1].data(), current_[0].data()) < 0)) ? 1 : 0;
+        target.mwrite(current_[take].data(), loaded[take]);
+        loaded[take] = 0;
+        wrote = true;
+      }
+      if (!wrote) break;
+      ++runs;
     }
-    if (!wrote) break;
-    ++runs;
-  }
-  return runs;
+    return runs;
+  });
 }
 
 void CEntrySort::Sort(MFile& raw, MFile& sorted) {

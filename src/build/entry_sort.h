@@ -68,7 +68,7 @@ class CEntrySort {
   CGlobalDefs& defs_;
   SortEntryLayout layout_;
   Module module_;
-  std::vector<uint8_t> arena_;     // the entries of the array, back to back
+  std::vector<uint8_t> arena_;       // the entries of the array, back to back
   std::vector<uint32_t> entries_a_;  // offsets into arena_
   std::vector<uint32_t> entries_b_;  // the merge sort's second array
   std::vector<uint8_t> current_[2];  // the merge's current entry of each input

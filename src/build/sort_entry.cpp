@@ -1,7 +1,6 @@
 #include "build/sort_entry.h"
 
 #include <algorithm>
-#include <cmath>
 #include <cstring>
 
 #include "platform/text_encoding.h"
@@ -14,11 +13,6 @@ namespace qm {
 namespace {
 
 constexpr std::size_t kTextLengthBytes = 2;
-
-template <class T>
-int Order(T a, T b) {
-  return a < b ? -1 : (a > b ? 1 : 0);
-}
 
 std::size_t ValueBytes(VALUE_TYPE type) {
   switch (type) {
@@ -58,71 +52,21 @@ std::size_t SortEntryLayout::TextLength(const uint8_t* p) const {
   return bytes::LoadU16(p + row_bytes_) & 0x7FFF;
 }
 
-int SortEntryLayout::CompareValues(const uint8_t* a, const uint8_t* b) const {
-  const uint8_t* va = a + row_bytes_;
-  const uint8_t* vb = b + row_bytes_;
-  switch (type_) {
-    case VALUE_TYPE::AsciiString: {
-      const std::size_t na = TextLength(a);
-      const std::size_t nb = TextLength(b);
-      const int c = std::memcmp(va + kTextLengthBytes, vb + kTextLengthBytes, std::min(na, nb));
-      return c != 0 ? c : Order(na, nb);
-    }
-    case VALUE_TYPE::UnicodeString: {
-      const std::size_t na = TextLength(a);
-      const std::size_t nb = TextLength(b);
-      const std::size_t n = std::min(na, nb);
-      const uint8_t* pa = va + kTextLengthBytes;
-      const uint8_t* pb = vb + kTextLengthBytes;
-      for (std::size_t i = 0; i < n; ++i) {
-        const uint16_t ua = bytes::LoadU16(pa + 2 * i);
-        const uint16_t ub = bytes::LoadU16(pb + 2 * i);
-        if (ua != ub) return ua < ub ? -1 : 1;
-      }
-      return Order(na, nb);
-    }
-    case VALUE_TYPE::Integer:
-      return Order(bytes::LoadI32(va), bytes::LoadI32(vb));
-    case VALUE_TYPE::Double: {
-      const double da = bytes::LoadDouble(va);
-      const double db = bytes::LoadDouble(vb);
-      // NaN has no place among numbers: a sort needs a total order, so it
-      // goes after every number.
-      const bool na = std::isnan(da);
-      const bool nb = std::isnan(db);
-      if (na || nb) return Order(na, nb);
-      return Order(da, db);
-    }
-    case VALUE_TYPE::DateTime: {
-      if (const int c = Order(bytes::LoadI16(va), bytes::LoadI16(vb)); c != 0) return c;
-      for (std::size_t at = 2; at < 12; at += 2) {
-        if (const int c = Order(bytes::LoadU16(va + at), bytes::LoadU16(vb + at)); c != 0) return c;
-      }
-      return Order(bytes::LoadU32(va + 12), bytes::LoadU32(vb + 12));
-    }
+std::size_t SortEntryLayout::Read(MFile& file, std::vector<uint8_t>& buffer,
+                                  std::size_t at) const {
+  auto room = [&](std::size_t n) {
+    if (buffer.size() < at + n) buffer.resize(std::max(at + n, 2 * buffer.size()));
+    return buffer.data() + at;
+  };
+  if (file.mread(room(fixed_size_), fixed_size_) == 0) return 0;
+  if (text_unit_ == 0) return fixed_size_;
+  const int16_t length = bytes::LoadI16(buffer.data() + at + row_bytes_);
+  if (length < 0) throw CMFileException::General("ReadValue");
+  const std::size_t size = fixed_size_ + static_cast<std::size_t>(length) * text_unit_;
+  if (size > fixed_size_ && file.mread(room(size) + fixed_size_, size - fixed_size_) == 0) {
+    throw CMFileException::Text("EOF error reading from disk", "mread", nullptr);
   }
-  return 0;
-}
-
-int SortEntryLayout::Compare(const uint8_t* a, const uint8_t* b) const {
-  if (const int c = CompareValues(a, b); c != 0) return c;
-  return Order(bytes::LoadI32(a), bytes::LoadI32(b));
-}
-
-bool SortEntryLayout::Read(MFile& file, std::vector<uint8_t>& out) const {
-  const std::size_t start = out.size();
-  uint8_t* p = Grow(out, fixed_size_);
-  if (file.mread(p, fixed_size_) == 0) {
-    out.resize(start);
-    return false;
-  }
-  if (text_unit_ != 0) {
-    const int16_t length = bytes::LoadI16(p + row_bytes_);
-    if (length < 0) throw CMFileException::General("ReadValue");
-    const std::size_t n = static_cast<std::size_t>(length) * text_unit_;
-    if (n > 0) file.ReadData(Grow(out, n), n);
-  }
-  return true;
+  return size;
 }
 
 void SortEntryLayout::AppendRow(std::vector<uint8_t>& out, std::span<const int32_t> row) {

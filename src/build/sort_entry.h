@@ -15,11 +15,114 @@
 #include <string_view>
 #include <vector>
 
+#include "shared/byte_layout.h"
 #include "shared/value.h"
 
 namespace qm {
 
 class MFile;
+
+// The comparisons of encoded entries, one per value type, so a sort loop can
+// be compiled for its type instead of switching on it per comparison.
+namespace entry_compare {
+
+template <class T>
+inline int Order(T a, T b) {
+  return a < b ? -1 : (a > b ? 1 : 0);
+}
+
+inline int Keys(const uint8_t* a, const uint8_t* b) {
+  return Order(bytes::LoadI32(a), bytes::LoadI32(b));
+}
+
+// Eight bytes as one number in which the first byte weighs most.
+inline uint64_t BigEndian64(const uint8_t* p) {
+  uint64_t v = 0;
+  for (int i = 0; i < 8; ++i) v = (v << 8) | p[i];
+  return v;
+}
+
+struct Narrow {
+  std::size_t row_bytes;
+  int operator()(const uint8_t* a, const uint8_t* b) const {
+    const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
+    const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
+    const uint8_t* pa = a + row_bytes + 2;
+    const uint8_t* pb = b + row_bytes + 2;
+    std::size_t n = na < nb ? na : nb;
+    // Unsigned bytes in order: eight at a time, then one at a time.
+    for (; n >= 8; n -= 8, pa += 8, pb += 8) {
+      const uint64_t x = BigEndian64(pa);
+      const uint64_t y = BigEndian64(pb);
+      if (x != y) return x < y ? -1 : 1;
+    }
+    for (; n > 0; --n, ++pa, ++pb) {
+      if (*pa != *pb) return *pa < *pb ? -1 : 1;
+    }
+    if (na != nb) return na < nb ? -1 : 1;
+    return Keys(a, b);
+  }
+};
+
+struct Wide {
+  std::size_t row_bytes;
+  int operator()(const uint8_t* a, const uint8_t* b) const {
+    const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
+    const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
+    const uint8_t* pa = a + row_bytes + 2;
+    const uint8_t* pb = b + row_bytes + 2;
+    const std::size_t n = na < nb ? na : nb;
+    for (std::size_t i = 0; i < n; ++i) {
+      const uint16_t ua = bytes::LoadU16(pa + 2 * i);
+      const uint16_t ub = bytes::LoadU16(pb + 2 * i);
+      if (ua != ub) return ua < ub ? -1 : 1;
+    }
+    if (na != nb) return na < nb ? -1 : 1;
+    return Keys(a, b);
+  }
+};
+
+struct Integer {
+  std::size_t row_bytes;
+  int operator()(const uint8_t* a, const uint8_t* b) const {
+    const int c = Order(bytes::LoadI32(a + row_bytes), bytes::LoadI32(b + row_bytes));
+    return c != 0 ? c : Keys(a, b);
+  }
+};
+
+// NaN has no place among numbers; a sort needs a total order, so it goes
+// after every number.
+struct Double {
+  std::size_t row_bytes;
+  int operator()(const uint8_t* a, const uint8_t* b) const {
+    const double x = bytes::LoadDouble(a + row_bytes);
+    const double y = bytes::LoadDouble(b + row_bytes);
+    int c;
+    if (x != x || y != y) {
+      c = Order(x != x, y != y);
+    } else {
+      c = Order(x, y);
+    }
+    return c != 0 ? c : Keys(a, b);
+  }
+};
+
+// Field by field: year (signed), month ... second, fraction.
+struct Date {
+  std::size_t row_bytes;
+  int operator()(const uint8_t* a, const uint8_t* b) const {
+    const uint8_t* va = a + row_bytes;
+    const uint8_t* vb = b + row_bytes;
+    int c = Order(bytes::LoadI16(va), bytes::LoadI16(vb));
+    for (std::size_t at = 2; c == 0 && at < 12; at += 2) {
+      c = Order(bytes::LoadU16(va + at), bytes::LoadU16(vb + at));
+    }
+    if (c == 0) c = Order(bytes::LoadU32(va + 12), bytes::LoadU32(vb + 12));
+    return c != 0 ? c : Keys(a, b);
+  }
+};
+
+}  // namespace entry_compare
 
 class SortEntryLayout {
  public:
@@ -39,13 +142,29 @@ class SortEntryLayout {
   // The largest text length the length field holds.
   static constexpr std::size_t kMaxTextLength = 32767;
 
-  // <0, 0, >0: by value, then by key.
-  int Compare(const uint8_t* a, const uint8_t* b) const;
+  // Calls f with the comparison of this layout's entries (an object of
+  // entry_compare: <0, 0, >0 by value, then by key) and returns its result.
+  template <class F>
+  decltype(auto) WithComparison(F&& f) const {
+    switch (type_) {
+      case VALUE_TYPE::AsciiString: return f(entry_compare::Narrow{row_bytes_});
+      case VALUE_TYPE::UnicodeString: return f(entry_compare::Wide{row_bytes_});
+      case VALUE_TYPE::Double: return f(entry_compare::Double{row_bytes_});
+      case VALUE_TYPE::DateTime: return f(entry_compare::Date{row_bytes_});
+      case VALUE_TYPE::Integer: break;
+    }
+    return f(entry_compare::Integer{row_bytes_});
+  }
+  int Compare(const uint8_t* a, const uint8_t* b) const {
+    return WithComparison([&](auto compare) { return compare(a, b); });
+  }
 
-  // Appends the next entry of file to out; false at the end of the file
-  // (nothing appended). A file that ends inside an entry raises the MFile
-  // error; so does a negative text length.
-  bool Read(MFile& file, std::vector<uint8_t>& out) const;
+  // Reads the next entry of file into buffer from offset at, making buffer
+  // larger when it must (never smaller, so a buffer reused for many entries
+  // stops growing). Returns the entry's size, or 0 at the end of the file.
+  // A file that ends inside an entry raises the MFile error; so does a
+  // negative text length.
+  std::size_t Read(MFile& file, std::vector<uint8_t>& buffer, std::size_t at) const;
 
   // --- encoding: one entry is the row, then exactly one value ---
   static void AppendRow(std::vector<uint8_t>& out, std::span<const int32_t> row);
@@ -64,7 +183,6 @@ class SortEntryLayout {
 
  private:
   std::size_t TextLength(const uint8_t* p) const;
-  int CompareValues(const uint8_t* a, const uint8_t* b) const;
 
   int32_t row_width_;
   VALUE_TYPE type_;

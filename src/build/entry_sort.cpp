@@ -1,10 +1,12 @@
 #include "build/entry_sort.h"
 
 #include <algorithm>
+#include <cstring>
 #include <filesystem>
 #include <new>
 #include <system_error>
 
+#include "build/sort_stream.h"
 #include "shared/checked_allocation.h"
 #include "shared/exception_family.h"
 #include "shared/global_defs.h"
@@ -105,31 +107,36 @@ void CEntrySort::SortArray() {
   if (result != entries_a_.data()) std::copy(result, result + n, entries_a_.data());
 }
 
-void CEntrySort::WriteRun(MFile& out) {
+void CEntrySort::WriteRun(SortFileWriter& out) {
   const uint8_t* base = arena_.data();
-  for (const uint32_t offset : entries_a_) {
-    out.mwrite(base + offset, layout_.SizeOf(base + offset));
-  }
+  for (const uint32_t offset : entries_a_) out.Put(base + offset, layout_.SizeOf(base + offset));
 }
 
 void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
-  raw.Seek(0);
+  SortFileReader reader(layout_);
+  reader.Start(raw);
+  SortFileWriter writers[2];
+  writers[0].Start(runs[0]);
+  writers[1].Start(runs[1]);
   int64_t traced = 0;
   for (bool more = true; more;) {
     std::size_t filled = 0;
     entries_a_.clear();
     while (entries_a_.size() < kArrayEntries) {
-      const std::size_t size = layout_.Read(raw, arena_, filled);
-      if (size == 0) {
+      std::size_t size = 0;
+      const uint8_t* entry = reader.Next(size);
+      if (entry == nullptr) {
         more = false;
         break;
       }
+      if (arena_.size() < filled + size) arena_.resize(std::max(filled + size, 2 * arena_.size()));
+      std::memcpy(arena_.data() + filled, entry, size);
       entries_a_.push_back(static_cast<uint32_t>(filled));
       filled += size;
     }
     if (entries_a_.empty()) break;
     SortArray();
-    WriteRun(runs[level_one_runs_ % 2]);
+    WriteRun(writers[level_one_runs_ % 2]);
     ++level_one_runs_;
     sorted_entries_ += static_cast<int64_t>(entries_a_.size());
     if (sorted_entries_ - traced >= kSortedTraceStep) {
@@ -137,20 +144,29 @@ void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
       Trace(defs_.TraceLevel2(), TraceTag(), "Words Sorted: %i", sorted_entries_);
     }
   }
+  writers[0].Finish();
+  writers[1].Finish();
 }
 
 int64_t CEntrySort::MergePass(MFile* in, MFile* out, int64_t run_length) {
-  return layout_.WithComparison([&](auto compare) {
-    // Per input: the size of the entry waiting in current_ (0: none), entries
-    // left in its run, the end of its file.
-    std::size_t loaded[2] = {0, 0};
+  SortFileReader readers[2] = {SortFileReader(layout_), SortFileReader(layout_)};
+  SortFileWriter writers[2];
+  for (int i = 0; i < 2; ++i) {
+    readers[i].Start(in[i]);
+    writers[i].Start(out[i]);
+  }
+  const int64_t runs = layout_.WithComparison([&](auto compare) {
+    // Per input: the entry waiting (null: none) and its size, entries left in
+    // its run, the end of its file.
+    const uint8_t* current[2] = {nullptr, nullptr};
+    std::size_t size[2] = {0, 0};
     bool ended[2] = {false, false};
     int64_t left[2] = {0, 0};
     auto ready = [&](int i) {
-      if (loaded[i] != 0) return true;
+      if (current[i] != nullptr) return true;
       if (left[i] == 0 || ended[i]) return false;
-      loaded[i] = layout_.Read(in[i], current_[i], 0);
-      if (loaded[i] == 0) {
+      current[i] = readers[i].Next(size[i]);
+      if (current[i] == nullptr) {
         ended[i] = true;
         return false;
       }
@@ -158,26 +174,29 @@ int64_t CEntrySort::MergePass(MFile* in, MFile* out, int64_t run_length) {
       return true;
     };
 
-    int64_t runs = 0;
+    int64_t written = 0;
     for (;;) {
       left[0] = left[1] = run_length;
-      MFile& target = out[runs % 2];
+      SortFileWriter& target = writers[written % 2];
       bool wrote = false;
       for (;;) {
         const bool a = ready(0);
         const bool b = ready(1);
         if (!a && !b) break;
         // The second input goes first only when strictly smaller.
-        const int take = (b && (!a || compare(current_[1].data(), current_[0].data()) < 0)) ? 1 : 0;
-        target.mwrite(current_[take].data(), loaded[take]);
-        loaded[take] = 0;
+        const int take = (b && (!a || compare(current[1], current[0]) < 0)) ? 1 : 0;
+        target.Put(current[take], size[take]);
+        current[take] = nullptr;
         wrote = true;
       }
       if (!wrote) break;
-      ++runs;
+      ++written;
     }
-    return runs;
+    return written;
   });
+  writers[0].Finish();
+  writers[1].Finish();
+  return runs;
 }
 
 void CEntrySort::Sort(MFile& raw, MFile& sorted) {
@@ -191,20 +210,21 @@ void CEntrySort::Sort(MFile& raw, MFile& sorted) {
   AllocateRowArrays();
   try {
     LevelOne(raw, level_one);
+    defs_.SetProgress(20);
+    FreeRowArrays();
+    raw.Close();
+    MergeLevelTwo(level_one, sorted);
   } catch (const std::bad_alloc&) {
     RaiseAllocationFailure();
   }
-  defs_.SetProgress(20);
-  FreeRowArrays();
-  raw.Close();
+}
 
+void CEntrySort::MergeLevelTwo(MFile* level_one, MFile& sorted) {
   MFile level_two[2];
   OpenSortFile(defs_, level_two[0]);
   OpenSortFile(defs_, level_two[1]);
   MFile* in = level_one;
   MFile* out = level_two;
-  in[0].Seek(0);
-  in[1].Seek(0);
   for (int64_t run_length = kArrayEntries;; run_length *= 2) {
     const int64_t runs = MergePass(in, out, run_length);
     ++passes_;
@@ -213,11 +233,9 @@ void CEntrySort::Sort(MFile& raw, MFile& sorted) {
     defs_.SetProgress(static_cast<int32_t>(20 + (70 / n) * n));
     if (runs <= 1) break;
     std::swap(in, out);
-    // Inputs of the next pass are read from their start; its outputs start empty.
-    for (int i = 0; i < 2; ++i) {
-      in[i].Seek(0);
-      out[i].Truncate(0);
-    }
+    // The next pass writes its outputs from empty files.
+    out[0].Truncate(0);
+    out[1].Truncate(0);
   }
   // The one run (or none) went to the first output.
   out[0].Seek(0);

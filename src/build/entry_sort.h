@@ -23,6 +23,7 @@
 namespace qm {
 
 class CGlobalDefs;
+class SortFileWriter;
 
 class CEntrySort {
  public:
@@ -56,12 +57,14 @@ class CEntrySort {
   void AllocateRowArrays();
   void FreeRowArrays();
   void SortArray();
-  void WriteRun(MFile& out);
+  void WriteRun(SortFileWriter& out);
   // Writes the runs alternately to runs[0] and runs[1].
   void LevelOne(MFile& raw, MFile* runs);
   // One merge pass; returns the number of runs written.
   // in and out point to two files each.
   int64_t MergePass(MFile* in, MFile* out, int64_t run_length);
+  // The passes of level two over the two level-one files, into sorted.
+  void MergeLevelTwo(MFile* level_one, MFile& sorted);
   [[noreturn]] void RaiseAllocationFailure();
   const char* TraceTag() const;
 
@@ -71,7 +74,6 @@ class CEntrySort {
   std::vector<uint8_t> arena_;       // the entries of the array, back to back
   std::vector<uint32_t> entries_a_;  // offsets into arena_
   std::vector<uint32_t> entries_b_;  // the merge sort's second array
-  std::vector<uint8_t> current_[2];  // the merge's current entry of each input
   int64_t sorted_entries_ = 0;
   int64_t level_one_runs_ = 0;
   int32_t passes_ = 0;

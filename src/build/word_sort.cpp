@@ -14,6 +14,7 @@
 #include "build/findex_type.h"
 #include "build/row_selection.h"
 #include "build/sort_entry.h"
+#include "build/sort_stream.h"
 #include "platform/local_time.h"
 #include "shared/column_set.h"
 #include "shared/exception_family.h"
@@ -91,9 +92,11 @@ struct RowPlan {
 class EntryWriter {
  public:
   EntryWriter(MFile& raw, const SortEntryLayout& layout, const CColumnSet& set)
-      : raw_(raw), layout_(layout), row_(static_cast<std::size_t>(set.Width()), 0),
+      : layout_(layout), row_(static_cast<std::size_t>(set.Width()), 0),
         score_column_(set.s != 0 ? set.ScoreColumn() : -1),
-        position_column_(set.p != 0 ? set.PositionColumn() : -1) {}
+        position_column_(set.p != 0 ? set.PositionColumn() : -1) {
+    raw_.Start(raw);
+  }
 
   void SetKey(int32_t key) { row_[0] = key; }
   void SetWeight(int32_t weight) {
@@ -108,7 +111,7 @@ class EntryWriter {
     entry_.clear();
     SortEntryLayout::AppendRow(entry_, row_);
     append_value(entry_);
-    raw_.mwrite(entry_.data(), entry_.size());
+    raw_.Put(entry_.data(), entry_.size());
     ++entries_;
   }
   void WriteText(std::u16string_view word) {
@@ -116,9 +119,11 @@ class EntryWriter {
   }
 
   int64_t Entries() const { return entries_; }
+  // REQUIRES: before the raw file is read.
+  void Finish() { raw_.Finish(); }
 
  private:
-  MFile& raw_;
+  SortFileWriter raw_;
   const SortEntryLayout& layout_;
   std::vector<int32_t> row_;
   int32_t score_column_;
@@ -287,6 +292,7 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
     if (database.MoveNext() != CShareDatabase::kRowFetched) break;
   }
 
+  writer.Finish();
   Trace(defs_.TraceLevel1(), kRowsTag, "End Status. Row Count %i, Word Count: %i, Null Count: %i",
         rows, writer.Entries(), nulls);
   definition.SortMax = sort_max;

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstring>
 
-#include "shared/byte_layout.h"
 #include "shared/exception_family.h"
 
 namespace qm {
@@ -42,17 +41,14 @@ bool SortFileReader::Have(std::size_t n) {
   return end_ >= n;
 }
 
-const uint8_t* SortFileReader::Next(std::size_t& size) {
+const uint8_t* SortFileReader::NextAfterRefill(std::size_t& size) {
   const std::size_t fixed = layout_.FixedSize();
   if (!Have(fixed)) {
     if (end_ == begin_) return nullptr;
     EndedInsideEntry();
   }
+  if (NegativeLength(buffer_.data() + begin_)) throw CMFileException::General("ReadValue");
   size = layout_.SizeOf(buffer_.data() + begin_);
-  if (layout_.IsText() &&
-      bytes::LoadI16(buffer_.data() + begin_ + 4 * static_cast<std::size_t>(layout_.RowWidth())) < 0) {
-    throw CMFileException::General("ReadValue");
-  }
   if (!Have(size)) EndedInsideEntry();
   const uint8_t* entry = buffer_.data() + begin_;
   begin_ += size;
@@ -65,13 +61,11 @@ void SortFileWriter::Start(MFile& file) {
   if (buffer_.empty()) buffer_.resize(kPieceBytes);
 }
 
-void SortFileWriter::Put(const uint8_t* entry, std::size_t size) {
-  if (filled_ + size > buffer_.size()) {
-    Finish();
-    if (size > buffer_.size()) {
-      file_->mwrite(entry, size);
-      return;
-    }
+void SortFileWriter::PutAfterFinish(const uint8_t* entry, std::size_t size) {
+  Finish();
+  if (size > buffer_.size()) {
+    file_->mwrite(entry, size);
+    return;
   }
   std::memcpy(buffer_.data() + filled_, entry, size);
   filled_ += size;

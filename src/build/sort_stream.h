@@ -6,6 +6,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <vector>
 
 #include "build/sort_entry.h"
@@ -23,9 +24,26 @@ class SortFileReader {
   void Start(MFile& file);
   // The next entry and its size, valid until the next call; null at the end.
   // A file that ends inside an entry raises the MFile error.
-  const uint8_t* Next(std::size_t& size);
+  const uint8_t* Next(std::size_t& size) {
+    // Most entries lie whole in the buffer: no call for them.
+    const std::size_t held = end_ - begin_;
+    if (held >= layout_.FixedSize()) {
+      const uint8_t* entry = buffer_.data() + begin_;
+      size = layout_.SizeOf(entry);
+      if (held >= size && !NegativeLength(entry)) {
+        begin_ += size;
+        return entry;
+      }
+    }
+    return NextAfterRefill(size);
+  }
 
  private:
+  bool NegativeLength(const uint8_t* entry) const {
+    return layout_.IsText() &&
+           (entry[4 * static_cast<std::size_t>(layout_.RowWidth()) + 1] & 0x80) != 0;
+  }
+  const uint8_t* NextAfterRefill(std::size_t& size);
   // At least n bytes buffered from begin_; false when the file ends first.
   bool Have(std::size_t n);
 
@@ -43,12 +61,21 @@ class SortFileWriter {
 
   // Entries go to file from its current position.
   void Start(MFile& file);
-  void Put(const uint8_t* entry, std::size_t size);
+  void Put(const uint8_t* entry, std::size_t size) {
+    if (filled_ + size <= buffer_.size()) {
+      std::memcpy(buffer_.data() + filled_, entry, size);
+      filled_ += size;
+      return;
+    }
+    PutAfterFinish(entry, size);
+  }
   // Hands what is gathered to the file. REQUIRES: before the file is read,
   // rewound or closed.
   void Finish();
 
  private:
+  void PutAfterFinish(const uint8_t* entry, std::size_t size);
+
   MFile* file_ = nullptr;
   std::vector<uint8_t> buffer_;
   std::size_t filled_ = 0;

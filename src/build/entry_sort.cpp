@@ -53,8 +53,8 @@ void CEntrySort::AllocateRowArrays() {
 
 void CEntrySort::FreeRowArrays() {
   std::vector<uint8_t>().swap(arena_);
-  std::vector<uint32_t>().swap(entries_a_);
-  std::vector<uint32_t>().swap(entries_b_);
+  std::vector<Slot>().swap(entries_a_);
+  std::vector<Slot>().swap(entries_b_);
 }
 
 void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
@@ -71,12 +71,16 @@ void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
 
 namespace {
 
-// Bottom-up merge sort of offsets into base, stable: on equal entries the
-// left one goes first. from and to hold n offsets each; returns the array
-// that holds the result.
-template <class Compare>
-uint32_t* MergeSortOffsets(const uint8_t* base, uint32_t* from, uint32_t* to, std::size_t n,
-                           Compare compare) {
+// Bottom-up merge sort of slots (prefix, offset into base), stable: on equal
+// entries the left one goes first. from and to hold n slots each; returns the
+// array that holds the result.
+template <class Slot, class Compare>
+Slot* MergeSortSlots(const uint8_t* base, Slot* from, Slot* to, std::size_t n, Compare compare) {
+  // The right entry goes first only when strictly smaller.
+  auto right_first = [&](const Slot& right, const Slot& left) {
+    if (right.prefix != left.prefix) return right.prefix < left.prefix;
+    return compare(base + right.offset, base + left.offset) < 0;
+  };
   for (std::size_t width = 1; width < n; width *= 2) {
     for (std::size_t left = 0; left < n; left += 2 * width) {
       const std::size_t mid = std::min(left + width, n);
@@ -84,10 +88,7 @@ uint32_t* MergeSortOffsets(const uint8_t* base, uint32_t* from, uint32_t* to, st
       std::size_t i = left;
       std::size_t j = mid;
       std::size_t k = left;
-      while (i < mid && j < right) {
-        // The right entry goes first only when strictly smaller.
-        to[k++] = compare(base + from[j], base + from[i]) < 0 ? from[j++] : from[i++];
-      }
+      while (i < mid && j < right) to[k++] = right_first(from[j], from[i]) ? from[j++] : from[i++];
       while (i < mid) to[k++] = from[i++];
       while (j < right) to[k++] = from[j++];
     }
@@ -101,15 +102,16 @@ uint32_t* MergeSortOffsets(const uint8_t* base, uint32_t* from, uint32_t* to, st
 void CEntrySort::SortArray() {
   const std::size_t n = entries_a_.size();
   entries_b_.resize(n);
-  const uint32_t* result = layout_.WithComparison([&](auto compare) {
-    return MergeSortOffsets(arena_.data(), entries_a_.data(), entries_b_.data(), n, compare);
+  const Slot* result = layout_.WithComparison([&](auto compare) {
+    for (Slot& slot : entries_a_) slot.prefix = compare.Prefix(arena_.data() + slot.offset);
+    return MergeSortSlots(arena_.data(), entries_a_.data(), entries_b_.data(), n, compare);
   });
   if (result != entries_a_.data()) std::copy(result, result + n, entries_a_.data());
 }
 
 void CEntrySort::WriteRun(SortFileWriter& out) {
   const uint8_t* base = arena_.data();
-  for (const uint32_t offset : entries_a_) out.Put(base + offset, layout_.SizeOf(base + offset));
+  for (const Slot& slot : entries_a_) out.Put(base + slot.offset, layout_.SizeOf(base + slot.offset));
 }
 
 void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
@@ -131,7 +133,7 @@ void CEntrySort::LevelOne(MFile& raw, MFile* runs) {
       }
       if (arena_.size() < filled + size) arena_.resize(std::max(filled + size, 2 * arena_.size()));
       std::memcpy(arena_.data() + filled, entry, size);
-      entries_a_.push_back(static_cast<uint32_t>(filled));
+      entries_a_.push_back(Slot{0, static_cast<uint32_t>(filled)});
       filled += size;
     }
     if (entries_a_.empty()) break;

@@ -72,8 +72,13 @@ class CEntrySort {
   SortEntryLayout layout_;
   Module module_;
   std::vector<uint8_t> arena_;       // the entries of the array, back to back
-  std::vector<uint32_t> entries_a_;  // offsets into arena_
-  std::vector<uint32_t> entries_b_;  // the merge sort's second array
+  // An entry of the array: where it lies in arena_, and its prefix.
+  struct Slot {
+    uint64_t prefix;
+    uint32_t offset;
+  };
+  std::vector<Slot> entries_a_;
+  std::vector<Slot> entries_b_;  // the merge sort's second array
   int64_t sorted_entries_ = 0;
   int64_t level_one_runs_ = 0;
   int32_t passes_ = 0;

@@ -48,10 +48,6 @@ SortEntryLayout::SortEntryLayout(int32_t row_width, VALUE_TYPE type)
       fixed_size_(row_bytes_ + ValueBytes(type)),
       text_unit_(type == VALUE_TYPE::AsciiString ? 1 : type == VALUE_TYPE::UnicodeString ? 2 : 0) {}
 
-std::size_t SortEntryLayout::TextLength(const uint8_t* p) const {
-  return bytes::LoadU16(p + row_bytes_) & 0x7FFF;
-}
-
 std::size_t SortEntryLayout::Read(MFile& file, std::vector<uint8_t>& buffer,
                                   std::size_t at) const {
   auto room = [&](std::size_t n) {

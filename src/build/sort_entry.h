@@ -42,8 +42,22 @@ inline uint64_t BigEndian64(const uint8_t* p) {
   return v;
 }
 
+// Each comparison also gives a prefix of an entry: a number that never
+// orders two entries against their comparison (a <= b gives Prefix(a) <=
+// Prefix(b)), so a sort can compare prefixes and look at the entries only
+// when they are equal.
+
 struct Narrow {
   std::size_t row_bytes;
+  // The first eight bytes, zero-padded.
+  uint64_t Prefix(const uint8_t* e) const {
+    const std::size_t n = bytes::LoadU16(e + row_bytes) & 0x7FFF;
+    const uint8_t* p = e + row_bytes + 2;
+    if (n >= 8) return BigEndian64(p);
+    uint64_t v = 0;
+    for (std::size_t i = 0; i < 8; ++i) v = (v << 8) | (i < n ? p[i] : 0);
+    return v;
+  }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
     const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
@@ -66,6 +80,14 @@ struct Narrow {
 
 struct Wide {
   std::size_t row_bytes;
+  // The first four units, zero-padded.
+  uint64_t Prefix(const uint8_t* e) const {
+    const std::size_t n = bytes::LoadU16(e + row_bytes) & 0x7FFF;
+    const uint8_t* p = e + row_bytes + 2;
+    uint64_t v = 0;
+    for (std::size_t i = 0; i < 4; ++i) v = (v << 16) | (i < n ? bytes::LoadU16(p + 2 * i) : 0);
+    return v;
+  }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
     const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
@@ -84,6 +106,12 @@ struct Wide {
 
 struct Integer {
   std::size_t row_bytes;
+  // Value and key whole, each moved into unsigned order.
+  uint64_t Prefix(const uint8_t* e) const {
+    const uint32_t value = bytes::LoadU32(e + row_bytes) ^ 0x80000000u;
+    const uint32_t key = bytes::LoadU32(e) ^ 0x80000000u;
+    return (uint64_t{value} << 32) | key;
+  }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const int c = Order(bytes::LoadI32(a + row_bytes), bytes::LoadI32(b + row_bytes));
     return c != 0 ? c : Keys(a, b);
@@ -94,6 +122,7 @@ struct Integer {
 // after every number.
 struct Double {
   std::size_t row_bytes;
+  uint64_t Prefix(const uint8_t*) const { return 0; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const double x = bytes::LoadDouble(a + row_bytes);
     const double y = bytes::LoadDouble(b + row_bytes);
@@ -110,6 +139,7 @@ struct Double {
 // Field by field: year (signed), month ... second, fraction.
 struct Date {
   std::size_t row_bytes;
+  uint64_t Prefix(const uint8_t*) const { return 0; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const uint8_t* va = a + row_bytes;
     const uint8_t* vb = b + row_bytes;
@@ -182,7 +212,7 @@ class SortEntryLayout {
   void DecodeValue(const uint8_t* p, CValue& value) const;
 
  private:
-  std::size_t TextLength(const uint8_t* p) const;
+  std::size_t TextLength(const uint8_t* p) const { return bytes::LoadU16(p + row_bytes_) & 0x7FFF; }
 
   int32_t row_width_;
   VALUE_TYPE type_;

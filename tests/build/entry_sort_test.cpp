@@ -27,15 +27,20 @@ void AppendRandomValue(const SortEntryLayout& layout, std::mt19937& random,
   const auto pick = [&](std::size_t n) { return static_cast<std::size_t>(random() % n); };
   switch (layout.Type()) {
     case VALUE_TYPE::AsciiString: {
-      // Bytes compare unsigned: "é" (C3 A9) sorts after "z".
-      static const char* const kWords[] = {"", "A", "AB", "B", "Z", "z", "é", "éa", "ÿ", "ZZ"};
+      // Bytes compare unsigned: "é" (C3 A9) sorts after "z". Long words
+      // differ only past their first eight bytes.
+      static const char* const kWords[] = {"",         "A",          "AB",         "B",
+                                           "Z",        "z",          "é",          "éa",
+                                           "ÿ",        "ZZ",         "ABCDEFGH",   "ABCDEFGHIJ",
+                                           "ABCDEFGHIK", "ABCDEFGHé", "ABCDEFGHIJKLMNOPQ"};
       layout.AppendText(out, std::string_view(kWords[pick(std::size(kWords))]));
       return;
     }
     case VALUE_TYPE::UnicodeString: {
       // By code unit: a surrogate pair (D800...) sorts before U+FF61.
-      static const char16_t* const kWords[] = {u"", u"A", u"AB", u"\uFF61", u"\U00010000", u"\u00E9",
-                                               u"\U0001F600x", u"B"};
+      static const char16_t* const kWords[] = {u"",      u"A",      u"AB",       u"\uFF61",
+                                               u"\U00010000", u"\u00E9", u"\U0001F600x", u"B",
+                                               u"ABCD",   u"ABCDE",  u"ABCDF",    u"ABCD\uFF61"};
       layout.AppendText(out, std::u16string_view(kWords[pick(std::size(kWords))]));
       return;
     }

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <numeric>
 #include <random>
 
 #include "build/sort_entry.h"
@@ -90,16 +91,11 @@ class EntrySortTest : public ::testing::Test {
     EXPECT_FALSE(raw.IsOpen());
     auto entries = ReadSortedEntries(sorted, 2, type);
     // Every raw entry comes out exactly once.
-    std::vector<int32_t> order;
+    std::vector<int32_t> order, expected(static_cast<std::size_t>(n));
     for (const auto& e : entries) order.push_back(e.row[1]);
     std::sort(order.begin(), order.end());
-    EXPECT_EQ(order.size(), static_cast<std::size_t>(n));
-    for (int i = 0; i < static_cast<int>(order.size()); ++i) {
-      if (order[static_cast<std::size_t>(i)] != i) {
-        ADD_FAILURE() << "entry " << i << " lost or repeated";
-        break;
-      }
-    }
+    std::iota(expected.begin(), expected.end(), 0);
+    EXPECT_TRUE(order == expected) << "entries lost or repeated";
     return entries;
   }
 

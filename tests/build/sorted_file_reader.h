@@ -68,15 +68,9 @@ inline std::vector<SortedEntry> ReadSortedEntries(MFile& file, int width, VALUE_
         break;
       }
       case VALUE_TYPE::DateTime: {
-        DateTimeValue d;
-        d.year = static_cast<int16_t>(LoadLe(bytes, at, 2));
-        d.month = static_cast<uint16_t>(LoadLe(bytes, at + 2, 2));
-        d.day = static_cast<uint16_t>(LoadLe(bytes, at + 4, 2));
-        d.hour = static_cast<uint16_t>(LoadLe(bytes, at + 6, 2));
-        d.minute = static_cast<uint16_t>(LoadLe(bytes, at + 8, 2));
-        d.second = static_cast<uint16_t>(LoadLe(bytes, at + 10, 2));
-        d.fraction = LoadLe(bytes, at + 12, 4);
-        e.value.SetDateTime(d);
+        auto u16 = [&](int i) { return static_cast<uint16_t>(LoadLe(bytes, at + 2 * i, 2)); };
+        e.value.SetDateTime({static_cast<int16_t>(u16(0)), u16(1), u16(2), u16(3), u16(4), u16(5),
+                             LoadLe(bytes, at + 12, 4)});
         at += 16;
         break;
       }

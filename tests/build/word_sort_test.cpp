@@ -88,15 +88,12 @@ class WordSortTest : public ::testing::TestWithParam<Source> {
       case VALUE_TYPE::UnicodeString: return Utf16ToUtf8(v.Wide());
       case VALUE_TYPE::Integer: return std::to_string(v.GetInteger());
       case VALUE_TYPE::Double: return std::to_string(v.GetDouble());
-      case VALUE_TYPE::DateTime: {
-        const DateTimeValue& t = v.GetDateTime();
-        char s[64];
-        std::snprintf(s, sizeof s, "%d-%u-%u %u:%u:%u", t.year, t.month, t.day, t.hour, t.minute,
-                      t.second);
-        return s;
-      }
+      case VALUE_TYPE::DateTime: break;
     }
-    return {};
+    const DateTimeValue& t = v.GetDateTime();
+    return std::to_string(t.year) + "-" + std::to_string(t.month) + "-" + std::to_string(t.day) +
+           " " + std::to_string(t.hour) + ":" + std::to_string(t.minute) + ":" +
+           std::to_string(t.second);
   }
 
   std::vector<Entry> SortedEntries(CIndexHeader& d) {

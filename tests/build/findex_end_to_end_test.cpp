@@ -153,13 +153,6 @@ TEST_P(FindexEndToEndTest, CreateFindexWithWeightsAndTagsAndEveryInformationValu
   EXPECT_TRUE(std::regex_match(Info("Books", idxLastUpdateTime), time));
   EXPECT_EQ(Info("Books", idxIndexMaxSize), "");
   EXPECT_EQ(Info("Books", idxIndexStartValue), "");
-
-  // The stored definition rebuilds the same findex.
-  ASSERT_EQ(Run("CREATE FINDEX books"), "");
-  EXPECT_EQ(Info("Books", idxWordCount), "8");
-  BSTR weight;
-  ASSERT_EQ(command_->GetIndexGeneralOption(igoSupportPhrases, VARIANT_FALSE, &weight), S_OK);
-  EXPECT_EQ(weight, u"1");
 }
 
 TEST_P(FindexEndToEndTest, NumberAndDateColumnsMakeTypedFindexes) {

@@ -23,13 +23,13 @@ constexpr const char* kErrorTag = "PILIB_ERROR.PiFindex.RenameIndex";
 constexpr int kExclusiveAttempts = 3;
 constexpr std::size_t kMaxNameCharacters = 199;
 
-std::mutex g_fault_mutex;
-std::function<bool(const std::string&)> g_rename_fault;
+std::mutex g_hook_mutex;
+std::function<bool(const std::string&)> g_rename_hook;
 
 void Rename(const std::string& from, const std::string& to) {
   {
-    std::lock_guard lock(g_fault_mutex);
-    if (g_rename_fault && g_rename_fault(to)) {
+    std::lock_guard lock(g_hook_mutex);
+    if (g_rename_hook && g_rename_hook(to)) {
       throw CWinFileException::Text("Error renaming file: %s to %s", "RemoveFile", nullptr, from,
                                     to);
     }
@@ -180,9 +180,9 @@ void DropFiles(const CGlobalDefs& defs, std::string_view name) {
   DropFile(paths.sdx);
 }
 
-void SetRenameFaultForTesting(std::function<bool(const std::string& target)> fault) {
-  std::lock_guard lock(g_fault_mutex);
-  g_rename_fault = std::move(fault);
+void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook) {
+  std::lock_guard lock(g_hook_mutex);
+  g_rename_hook = std::move(hook);
 }
 
 }  // namespace qm::findex

@@ -58,9 +58,10 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
 // locks of the findex.
 void DropFiles(const CGlobalDefs& defs, std::string_view name);
 
-// Tests: a rename onto a target for which fault returns true fails as if the
-// file system refused it; an empty function restores renaming.
-void SetRenameFaultForTesting(std::function<bool(const std::string& target)> fault);
+// Tests: hook runs before every rename onto a target; when it returns true
+// the rename fails as if the file system refused it. An empty function
+// removes the hook.
+void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook);
 
 }  // namespace findex
 }  // namespace qm

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <atomic>
 #include <limits>
+#include <new>
+#include <optional>
 #include <vector>
 
 #include "platform/file_io.h"
@@ -18,6 +20,7 @@ namespace qm {
 namespace {
 
 constexpr const char* kMethod = "BuildRowFindex";
+constexpr const char* kErrorTag = "PILIB_ERROR.PiFindex.BuildRowFindex";
 
 std::atomic<int32_t> g_max_block_number{CFindexTreeWriter::kMaxBlockNumber};
 std::atomic<int64_t> g_max_fst_bytes{CFindexPostingWriter::kMaxFileBytes};
@@ -57,15 +60,23 @@ void SetFindexLimitsForTesting(const FindexLimits& limits) {
   g_max_fst_bytes.store(std::min(limits.max_fst_bytes, CFindexPostingWriter::kMaxFileBytes));
 }
 
-FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted,
-                                   const std::string& sdx_path, const std::string& fst_path,
-                                   const FindexLimits& limits,
-                                   std::function<void(int32_t rows)> batch_observer) {
+namespace {
+
+FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
+                             const std::string& fst_path, const FindexLimits& limits,
+                             std::function<void(int32_t rows)> batch_observer) {
   const CColumnSet columns = CColumnSet::FromGeneralFlags(header.GeneralFlags);
+  std::optional<CFindexPostingWriter> posting_writer;
+  try {
+    posting_writer.emplace(columns, limits.max_fst_bytes);
+  } catch (const std::bad_alloc&) {
+    Trace(true, kErrorTag, "Out of memory 1");
+    throw CPiFIndexException::Numbered(11, kMethod, nullptr);
+  }
+  CFindexPostingWriter& postings = *posting_writer;
   BFile sdx;
   sdx.OpenFile(sdx_path, BFile::kCreate, CFindexTreeWriter::kBlockUnits);
   CFindexTreeWriter tree(sdx, limits.max_block_number);
-  CFindexPostingWriter postings(columns, limits.max_fst_bytes);
   postings.Create(fst_path);
   postings.SetBatchObserver(std::move(batch_observer));
 
@@ -118,6 +129,20 @@ FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted,
   sdx.Close();
   SyncToDisk(sdx_path);
   return counts;
+}
+
+}  // namespace
+
+FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted,
+                                   const std::string& sdx_path, const std::string& fst_path,
+                                   const FindexLimits& limits,
+                                   std::function<void(int32_t rows)> batch_observer) {
+  try {
+    return WriteFiles(header, sorted, sdx_path, fst_path, limits, std::move(batch_observer));
+  } catch (const std::bad_alloc&) {
+    Trace(true, kErrorTag, "Out of memory 2");
+    throw CPiFIndexException::Numbered(11, kMethod, nullptr);
+  }
 }
 
 }  // namespace qm

@@ -87,7 +87,9 @@ std::string Utf16LeFile(const std::u16string& text) {
 
 int RunProgram(const std::vector<std::string>& argv, std::string* out) {
   int pipefd[2] = {-1, -1};
-  if (out != nullptr && pipe(pipefd) != 0) return -1;
+  // Close-on-exec: a child started at the same time by another thread must not
+  // keep this pipe open, or this read would wait for that child to end.
+  if (out != nullptr && pipe2(pipefd, O_CLOEXEC) != 0) return -1;
   const pid_t pid = fork();
   if (pid == 0) {
     if (out != nullptr) {

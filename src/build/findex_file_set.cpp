@@ -5,6 +5,7 @@
 #include <utility>
 #include <vector>
 
+#include "build/deleted_keys.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -165,9 +166,7 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
     // one no longer apply.
     Guard<CPiFIndexException>(kRenameMethod, [&] {
       DropAddOns(defs, name);
-      CLockManager deleted_keys_lock(group, ToUpper(name), kLockDeletedKeys);
-      deleted_keys_lock.LockExclusive();
-      DropFile(target.del);
+      DropDeletedKeys(defs, name);
     });
   }
 }

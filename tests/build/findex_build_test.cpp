@@ -187,7 +187,7 @@ TEST_F(FindexBuildTest, FailedBuildsLeaveTheFindexAsItWasAndNoTemporaryFile) {
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
     c.arrange();
-    EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { Build("Books", c.entries, true); }).find(c.raised),
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] { Build("Books", c.entries, true); }).text.find(c.raised),
               std::string::npos);
     EXPECT_EQ(Files(), files);
     EXPECT_EQ(Bytes("BOOKS.sdx"), sdx);
@@ -205,7 +205,7 @@ TEST_F(FindexBuildTest, DropRemovesTheFindexWithItsAddOnsAndDeletedKeysButNotAnA
   const auto files = Files();
   CPiFIndex findex(defs_);
   findex.Open("Books_add_1", 3);
-  EXPECT_EQ(test::RaisedNumber<CPiFIndexException>([&] { findex.DropFindex(); }), 44);
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { findex.DropFindex(); }).number, 44);
   EXPECT_EQ(Files(), files);
 
   CLockManager files_lock("PUBLIC", "Books", kLockFindex);
@@ -223,16 +223,16 @@ TEST_F(FindexBuildTest, OpenReadsOnlyExistingFindexesUnderPlainNames) {
   const auto files = Files();
   const std::string sdx = Bytes("BOOKS.sdx");
   CPiFIndex findex(defs_);
-  EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { findex.Open("Missing", 3); }), "");
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open("Missing", 3); }).text, "");
   // Modes that create or truncate never touch an existing findex.
   for (int32_t mode : {1, 2, 5}) {
-    EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { findex.Open("Books", mode); }).find("Unknown index mode"),
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open("Books", mode); }).text.find("Unknown index mode"),
               std::string::npos);
   }
   for (const std::string& name : {std::string(), std::string(".."), std::string("../Books"),
                                    std::string("a\\b"), std::string("a\"b"), std::string("a\nb"),
                                    std::string(200, 'n')}) {
-    EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { findex.Open(name, 4); }).find("Invalid findex name"),
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open(name, 4); }).text.find("Invalid findex name"),
               std::string::npos)
         << name;
   }

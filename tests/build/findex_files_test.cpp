@@ -162,18 +162,18 @@ TEST_F(FindexFilesTest, LongPostingListsGoInBatchesWithTheCountPatchedIn) {
 TEST_F(FindexFilesTest, TreeAndPostingLimitsRaiseInsteadOfWritingWrongNumbers) {
   // Values of 2,000 bytes: two per leaf and per node, so the root is full
   // after eight leaves.
-  EXPECT_EQ(test::RaisedNumber<CPiFIndexException>([&] { Write(LongWords(40, 2000), 0); }), 29);
-  EXPECT_EQ(test::RaisedText<CPiFIndexException>([&] { Write(LongWords(1, 4090), 0); }),
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(LongWords(40, 2000), 0); }).number, 29);
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(LongWords(1, 4090), 0); }).text,
             "Error inserting row leaf (Module:PiFIndex,Method:buildrowfindex)");
 
   FindexLimits blocks;
   blocks.max_block_number = 20;
-  EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { Write(LongWords(300, 400), 0, 2, blocks); })
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] { Write(LongWords(300, 400), 0, 2, blocks); }).text
                 .find("would need more than 21 blocks, the most that 16-bit block numbers address"),
             std::string::npos);
   FindexLimits bytes;
   bytes.max_fst_bytes = 1000;
-  EXPECT_NE(test::RaisedText<CPiFIndexException>([&] { Write(LongWords(300, 10), 0, 2, bytes); })
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] { Write(LongWords(300, 10), 0, 2, bytes); }).text
                 .find("would pass 1000 bytes, the most that 32-bit positions address"),
             std::string::npos);
   // Just within both limits the same data is written whole.
@@ -186,7 +186,7 @@ TEST_F(FindexFilesTest, TreeAndPostingLimitsRaiseInsteadOfWritingWrongNumbers) {
 
 TEST_F(FindexFilesTest, EntriesOutOfOrderAreRefused) {
   const std::vector<Entry> entries = {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}};
-  EXPECT_EQ(test::RaisedText<CPiFIndexException>([&] { Write(entries, 0); }),
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(entries, 0); }).text,
             "Sorted entry file out of order at entry 2 (Module:PiFIndex,Method:BuildRowFindex)");
 }
 

@@ -80,6 +80,10 @@ TEST_F(FindexFilesTest, SmallFindexReadsBackWithEachColumnSet) {
     EXPECT_EQ(findex.block_num, 6);
     EXPECT_EQ(counts.blocks, 6);
     EXPECT_EQ(findex.nodes_per_level, (std::vector<int32_t>{1, 1, 1}));
+    // Numbers in the order handed out: root 1, the nodes it starts 2 and 3.
+    EXPECT_EQ(findex.nodes.at(1).children.front(), 2);
+    EXPECT_EQ(findex.nodes.at(2).children.front(), 3);
+    EXPECT_EQ(findex.leaves, std::vector<int32_t>{4});
     EXPECT_EQ(findex.findex_type, 2);
     EXPECT_EQ(header_.BlockNum, 6);
     EXPECT_EQ(header_.WordCount, 8);

@@ -50,8 +50,8 @@ void LockExclusively(CLockManager& lock, std::string_view name) {
             kExclusiveAttempts);
       if (attempt == kExclusiveAttempts) {
         throw CPiFIndexException::Text(
-            "Could not get exclusive access to findex %s to put the new build in place", kRenameMethod,
-            &e, name);
+            "Could not get exclusive access to findex %s to put the new build in place",
+            kRenameMethod, &e, name);
       }
     }
   }

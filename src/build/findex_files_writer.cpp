@@ -39,8 +39,8 @@ bool IsFindexType(int32_t type) {
 
 // Pushes a closed file's data to the disk before it is moved into place.
 void SyncToDisk(const std::string& path) {
-  platform::FileHandle file =
-      platform::OpenFileAs(path, platform::FileAccess::Read, platform::FileDisposition::OpenExisting);
+  platform::FileHandle file = platform::OpenFileAs(path, platform::FileAccess::Read,
+                                                   platform::FileDisposition::OpenExisting);
   if (!file.IsOpen() || !platform::SyncFileData(file.Get())) {
     throw CPiFIndexException::Text("Error writing to disk: %s", kMethod, nullptr, path);
   }
@@ -115,7 +115,8 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
 
   FindexWriteCounts counts;
   counts.blocks = tree.Finish();
-  counts.words = static_cast<int32_t>(std::min<int64_t>(entries, std::numeric_limits<int32_t>::max()));
+  counts.words =
+      static_cast<int32_t>(std::min<int64_t>(entries, std::numeric_limits<int32_t>::max()));
   counts.distinct = tree.DistinctWords();
   postings.Close();
 
@@ -133,9 +134,8 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
 
 }  // namespace
 
-FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted,
-                                   const std::string& sdx_path, const std::string& fst_path,
-                                   const FindexLimits& limits,
+FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
+                                   const std::string& fst_path, const FindexLimits& limits,
                                    std::function<void(int32_t rows)> batch_observer) {
   try {
     return WriteFiles(header, sorted, sdx_path, fst_path, limits, std::move(batch_observer));

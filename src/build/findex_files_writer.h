@@ -29,9 +29,9 @@ struct FindexLimits {
 void SetFindexLimitsForTesting(const FindexLimits& limits);
 
 struct FindexWriteCounts {
-  int32_t blocks = 0;     // blocks of the .sdx, the header included
-  int32_t words = 0;      // entries read (saturating)
-  int32_t distinct = 0;   // leaf rows: distinct values
+  int32_t blocks = 0;    // blocks of the .sdx, the header included
+  int32_t words = 0;     // entries read (saturating)
+  int32_t distinct = 0;  // leaf rows: distinct values
 };
 
 // Reads the entries of sorted from its current position to its end (item
@@ -42,9 +42,8 @@ struct FindexWriteCounts {
 // return; on failure their contents are undefined (the caller removes them).
 // An entry file out of order raises rather than write a tree that searches
 // would misread.
-FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted,
-                                   const std::string& sdx_path, const std::string& fst_path,
-                                   const FindexLimits& limits,
+FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
+                                   const std::string& fst_path, const FindexLimits& limits,
                                    std::function<void(int32_t rows)> batch_observer = {});
 
 }  // namespace qm

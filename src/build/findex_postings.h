@@ -79,7 +79,7 @@ class CFindexPostingWriter {
   int64_t postings_ = 0;
   std::vector<int32_t> pending_;  // the posting still open to later entries
   bool has_pending_ = false;
-  std::vector<int32_t> batch_;    // whole postings, up to kBatchRows rows
+  std::vector<int32_t> batch_;  // whole postings, up to kBatchRows rows
   int32_t batch_rows_ = 0;
   std::vector<uint8_t> encoded_;  // a batch in the file's byte order
   std::vector<uint8_t> count_row_;

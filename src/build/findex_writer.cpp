@@ -76,9 +76,10 @@ void CPiFIndex::Open(std::string_view name, int32_t mode) {
       state_->header = std::move(header);
     } else {
       // Modes 1 and 2 create or truncate: an existing findex is never opened so.
-      throw CPiFIndexException::Text("Unknown index mode %i: findexes open for reading (3) or "
-                                     "for a build (4)",
-                                     "Open", nullptr, mode);
+      throw CPiFIndexException::Text(
+          "Unknown index mode %i: findexes open for reading (3) or "
+          "for a build (4)",
+          "Open", nullptr, mode);
     }
     state_->name = std::string(name);
     state_->mode = mode;
@@ -120,8 +121,8 @@ void CPiFIndex::BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool re
         definition.ConnectionString = defs_.GetConnectionString();
         definition.DisplayName = defs_.GetDisplayName();
       }
-      const FindexWriteCounts counts = WriteFindexFiles(
-          definition, sorted, state_->temp_sdx, state_->temp_fst, FindexLimits::Current());
+      const FindexWriteCounts counts = WriteFindexFiles(definition, sorted, state_->temp_sdx,
+                                                        state_->temp_fst, FindexLimits::Current());
       Trace(defs_.TraceLevel1(), kTraceTag,
             "End Status: BlockNum: %i, WordCount: %i, DistinctWords: %i, IntVersion: %i",
             counts.blocks, counts.words, counts.distinct, CGlobalDefs::kVersion);
@@ -140,7 +141,8 @@ void CPiFIndex::BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool re
 void CPiFIndex::DropFindex() {
   Guarded("DropFindex", [&] {
     if (state_->mode == 0) throw CPiFIndexException::General("DropFindex");
-    if (findex::IsAddOnName(state_->name)) throw CPiFIndexException::Numbered(44, "DropFindex", nullptr);
+    if (findex::IsAddOnName(state_->name))
+      throw CPiFIndexException::Numbered(44, "DropFindex", nullptr);
     const std::string name = state_->name;
     Close();
     findex::DropFiles(defs_, name);

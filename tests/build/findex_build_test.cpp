@@ -68,12 +68,14 @@ class FindexBuildTest : public ::testing::Test {
   }
   std::set<std::string> Files() const {
     std::set<std::string> names;
-    for (const auto& f : fs::directory_iterator(Indexes())) names.insert(f.path().filename().string());
+    for (const auto& f : fs::directory_iterator(Indexes()))
+      names.insert(f.path().filename().string());
     return names;
   }
   std::string Bytes(const std::string& file) const { return test::ReadFile(Indexes() + file); }
   test::DecodedFindex Decode(const std::string& upper_name) const {
-    return test::DecodeFindex(Indexes() + upper_name + ".sdx", Indexes() + upper_name + ".fst", 2, 3);
+    return test::DecodeFindex(Indexes() + upper_name + ".sdx", Indexes() + upper_name + ".fst", 2,
+                              3);
   }
 
   test::ConfiguredHome home_;
@@ -138,8 +140,9 @@ TEST_F(FindexBuildTest, AnAddOnUpdateReplacesOnlyItsAddOnAndARebuildDropsAddOnsA
   const auto update = Words("again", 12);
   Build("Books_ADD_1", update, false);
   Build("Books_ADD_2", Words("two", 3), false);
-  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKS.del", "BOOKS.fst", "BOOKS.sdx", "BOOKS_ADD_1.fst",
-                                            "BOOKS_ADD_1.sdx", "BOOKS_ADD_2.fst", "BOOKS_ADD_2.sdx"}));
+  EXPECT_EQ(Files(),
+            (std::set<std::string>{"BOOKS.del", "BOOKS.fst", "BOOKS.sdx", "BOOKS_ADD_1.fst",
+                                   "BOOKS_ADD_1.sdx", "BOOKS_ADD_2.fst", "BOOKS_ADD_2.sdx"}));
   EXPECT_EQ(Decode("BOOKS_ADD_1").words, test::ExpectedWords(update, 3));
   EXPECT_EQ(Bytes("BOOKS.sdx"), main_sdx);
   EXPECT_EQ(Bytes("BOOKS.fst"), main_fst);
@@ -170,24 +173,35 @@ TEST_F(FindexBuildTest, FailedBuildsLeaveTheFindexAsItWasAndNoTemporaryFile) {
   const std::vector<Case> cases = {
       {"block numbers", [&] { SetFindexLimitsForTesting(few_blocks); }, Words("x", 300, 400),
        "16-bit block numbers"},
-      {"positions", [&] { SetFindexLimitsForTesting(few_bytes); }, Words("x", 300), "32-bit positions"},
-      {"full root", [] { SetFindexLimitsForTesting({}); }, Words("x", 40, 2000), "too large for its word tree"},
-      {"unsorted", [] {}, {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}}, "out of order"},
-      {"rename", [&] {
+      {"positions", [&] { SetFindexLimitsForTesting(few_bytes); }, Words("x", 300),
+       "32-bit positions"},
+      {"full root", [] { SetFindexLimitsForTesting({}); }, Words("x", 40, 2000),
+       "too large for its word tree"},
+      {"unsorted",
+       [] {},
+       {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}},
+       "out of order"},
+      {"rename",
+       [&] {
          findex::SetRenameHookForTesting([&](const std::string& target) {
            return target.ends_with("/BOOKS.fst") && ++renames == 1;
          });
-       }, Words("x", 30), "Error renaming index file"},
-      {"readers", [&] {
+       },
+       Words("x", 30), "Error renaming index file"},
+      {"readers",
+       [&] {
          findex::SetRenameHookForTesting({});
          reader.LockReader();
          CLockManager::ScaleTimeoutsForTesting(0.001);
-       }, Words("x", 30), "Could not get exclusive access to findex BOOKS"},
+       },
+       Words("x", 30), "Could not get exclusive access to findex BOOKS"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
     c.arrange();
-    EXPECT_NE(test::Raised<CPiFIndexException>([&] { Build("Books", c.entries, true); }).text.find(c.raised),
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                Build("Books", c.entries, true);
+              }).text.find(c.raised),
               std::string::npos);
     EXPECT_EQ(Files(), files);
     EXPECT_EQ(Bytes("BOOKS.sdx"), sdx);
@@ -226,13 +240,17 @@ TEST_F(FindexBuildTest, OpenReadsOnlyExistingFindexesUnderPlainNames) {
   EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open("Missing", 3); }).text, "");
   // Modes that create or truncate never touch an existing findex.
   for (int32_t mode : {1, 2, 5}) {
-    EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open("Books", mode); }).text.find("Unknown index mode"),
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                findex.Open("Books", mode);
+              }).text.find("Unknown index mode"),
               std::string::npos);
   }
-  for (const std::string& name : {std::string(), std::string(".."), std::string("../Books"),
-                                   std::string("a\\b"), std::string("a\"b"), std::string("a\nb"),
-                                   std::string(200, 'n')}) {
-    EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open(name, 4); }).text.find("Invalid findex name"),
+  for (const std::string& name :
+       {std::string(), std::string(".."), std::string("../Books"), std::string("a\\b"),
+        std::string("a\"b"), std::string("a\nb"), std::string(200, 'n')}) {
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                findex.Open(name, 4);
+              }).text.find("Invalid findex name"),
               std::string::npos)
         << name;
   }
@@ -266,7 +284,8 @@ TEST_F(FindexBuildTest, ReadersUnderTheFindexLockSeeTheWholeOldOrNewFindex) {
       const test::DecodedFindex decoded = Decode("BOOKS");
       lock.UnlockReaders();
       if (!decoded.faults.empty()) seen_faults.push_back(decoded.faults.front());
-      if (decoded.words != small_words && decoded.words != large_words) seen_faults.push_back("mixed");
+      if (decoded.words != small_words && decoded.words != large_words)
+        seen_faults.push_back("mixed");
       ++reads;
       // Pacing, so the builder's wait for every reader unit is not starved.
       std::this_thread::sleep_for(std::chrono::milliseconds(5));

@@ -23,7 +23,9 @@ uint64_t Get(const std::string& in, std::size_t at, int n) {
   return v;
 }
 
-int32_t GetInt(const std::string& in, std::size_t at) { return static_cast<int32_t>(Get(in, at, 4)); }
+int32_t GetInt(const std::string& in, std::size_t at) {
+  return static_cast<int32_t>(Get(in, at, 4));
+}
 
 // The value encoding of the sorted entry file and of blocks (the same).
 void Encode(std::string& out, const WordValue& value) {
@@ -38,7 +40,8 @@ void Encode(std::string& out, const WordValue& value) {
     for (char16_t c : *w) Put(out, c, 2);
   }
   if (const auto* t = std::get_if<Date16>(&value)) {
-    for (uint16_t part : {static_cast<uint16_t>(t->year), t->month, t->day, t->hour, t->minute, t->second}) {
+    for (uint16_t part :
+         {static_cast<uint16_t>(t->year), t->month, t->day, t->hour, t->minute, t->second}) {
       Put(out, part, 2);
     }
     Put(out, t->fraction, 4);
@@ -46,27 +49,37 @@ void Encode(std::string& out, const WordValue& value) {
 }
 
 // A value of the type at pos, not past limit; nullopt when it would overrun.
-std::optional<WordValue> Decode(const std::string& in, std::size_t& pos, std::size_t limit, int32_t type) {
+std::optional<WordValue> Decode(const std::string& in, std::size_t& pos, std::size_t limit,
+                                int32_t type) {
   const std::size_t at = pos;
   const bool text = type == 2 || type == 4;
   const std::size_t n = text && at + 2 <= limit ? Get(in, at, 2) : 0;
-  const std::size_t size = type == 1 ? 4 : type == 6 ? 8 : type == 3 ? 16 : type == 2 ? 2 + n : 2 + 2 * n;
+  const std::size_t size = type == 1   ? 4
+                           : type == 6 ? 8
+                           : type == 3 ? 16
+                           : type == 2 ? 2 + n
+                                       : 2 + 2 * n;
   if (at + size > limit || (text && at + 2 > limit)) return std::nullopt;
   pos += size;
   switch (type) {
-    case 1: return WordValue(GetInt(in, at));
-    case 6: return WordValue(std::bit_cast<double>(Get(in, at, 8)));
-    case 2: return WordValue(in.substr(at + 2, n));
+    case 1:
+      return WordValue(GetInt(in, at));
+    case 6:
+      return WordValue(std::bit_cast<double>(Get(in, at, 8)));
+    case 2:
+      return WordValue(in.substr(at + 2, n));
     case 4: {
       std::u16string w;
-      for (std::size_t i = 0; i < n; ++i) w.push_back(static_cast<char16_t>(Get(in, at + 2 + 2 * i, 2)));
+      for (std::size_t i = 0; i < n; ++i)
+        w.push_back(static_cast<char16_t>(Get(in, at + 2 + 2 * i, 2)));
       return WordValue(w);
     }
     default: {
-      Date16 d{static_cast<int16_t>(Get(in, at, 2)), static_cast<uint16_t>(Get(in, at + 2, 2)),
-               static_cast<uint16_t>(Get(in, at + 4, 2)), static_cast<uint16_t>(Get(in, at + 6, 2)),
-               static_cast<uint16_t>(Get(in, at + 8, 2)), static_cast<uint16_t>(Get(in, at + 10, 2)),
-               static_cast<uint32_t>(Get(in, at + 12, 4))};
+      Date16 d{
+          static_cast<int16_t>(Get(in, at, 2)),      static_cast<uint16_t>(Get(in, at + 2, 2)),
+          static_cast<uint16_t>(Get(in, at + 4, 2)), static_cast<uint16_t>(Get(in, at + 6, 2)),
+          static_cast<uint16_t>(Get(in, at + 8, 2)), static_cast<uint16_t>(Get(in, at + 10, 2)),
+          static_cast<uint32_t>(Get(in, at + 12, 4))};
       return WordValue(d);
     }
   }
@@ -76,16 +89,23 @@ class Decoder {
  public:
   Decoder(const std::string& sdx_path, const std::string& fst_path, int32_t type, int32_t flags,
           DecodedFindex& out)
-      : sdx_(ReadFile(sdx_path)), fst_(ReadFile(fst_path)), type_(type),
-        width_(1 + (flags & 1) + ((flags & 2) >> 1)), out_(out) {}
+      : sdx_(ReadFile(sdx_path)),
+        fst_(ReadFile(fst_path)),
+        type_(type),
+        width_(1 + (flags & 1) + ((flags & 2) >> 1)),
+        out_(out) {}
 
   void Run() {
     if (sdx_.size() < kBlock) return Fault("no header block");
     out_.block_num = GetInt(sdx_, 10);
-    if (GetInt(sdx_, 14) != 614 || sdx_.substr(18, 6) != std::string("\x04\x00" "6.14", 6)) Fault("version");
+    if (GetInt(sdx_, 14) != 614 || sdx_.substr(18, 6) != std::string("\x04\x00"
+                                                                     "6.14",
+                                                                     6))
+      Fault("version");
     if (GetInt(sdx_, 24) != 1) Fault("build state");
     out_.findex_type = GetInt(sdx_, 28);
-    if (sdx_.size() != static_cast<std::size_t>(out_.block_num) * kBlock) Fault("size is not BlockNum blocks");
+    if (sdx_.size() != static_cast<std::size_t>(out_.block_num) * kBlock)
+      Fault("size is not BlockNum blocks");
     if (out_.block_num < 2) {
       if (!fst_.empty()) Fault("postings without words");
       return;
@@ -94,7 +114,8 @@ class Decoder {
     Walk(1, 0);
     // Each block once, but the end leaf: once from the last node of each level.
     for (int32_t b = 1; b < out_.block_num; ++b) {
-      if (visits_[b] != (b == end_leaf_ ? 3 : 1)) Fault("block " + std::to_string(b) + " reached " + std::to_string(visits_[b]) + "x");
+      if (visits_[b] != (b == end_leaf_ ? 3 : 1))
+        Fault("block " + std::to_string(b) + " reached " + std::to_string(visits_[b]) + "x");
     }
     const auto& leaves = out_.leaves;
     for (std::size_t i = 0; i < leaves.size(); ++i) {
@@ -103,14 +124,17 @@ class Decoder {
         Fault("leaf chain at " + std::to_string(leaves[i]));
       }
     }
-    if (end_leaf_ != 0 && (Link(end_leaf_, 2) != 0 || Link(end_leaf_, 4) != 0)) Fault("end leaf linked");
+    if (end_leaf_ != 0 && (Link(end_leaf_, 2) != 0 || Link(end_leaf_, 4) != 0))
+      Fault("end leaf linked");
     ReadPostings();
   }
 
  private:
   void Fault(const std::string& text) { out_.faults.push_back(text); }
   std::size_t At(int32_t block) const { return static_cast<std::size_t>(block) * kBlock; }
-  int32_t Link(int32_t block, int offset) const { return static_cast<int32_t>(Get(sdx_, At(block) + offset, 2)); }
+  int32_t Link(int32_t block, int offset) const {
+    return static_cast<int32_t>(Get(sdx_, At(block) + offset, 2));
+  }
 
   // Walks the subtree of block at level (0 root, 3 leaf); returns its highest value.
   std::optional<WordValue> Walk(int32_t block, int level) {
@@ -180,7 +204,8 @@ class Decoder {
       if (count < 2 || cursor > fst_.size()) return Fault("bad count " + std::to_string(count));
       for (int32_t r = 1; r < count; ++r) {
         Posting posting;
-        for (int32_t c = 0; c < width_; ++c) posting.push_back(GetInt(fst_, position + row * r + 4 * c));
+        for (int32_t c = 0; c < width_; ++c)
+          posting.push_back(GetInt(fst_, position + row * r + 4 * c));
         out_.words[w].postings.push_back(std::move(posting));
       }
     }

@@ -58,10 +58,10 @@ struct DecodedNode {
 };
 
 struct DecodedFindex {
-  int32_t block_num = 0;     // from the header
-  int32_t findex_type = 0;   // from the header
-  std::vector<Word> words;   // in tree order
-  std::vector<int32_t> leaves;                // non-empty leaves in tree order
+  int32_t block_num = 0;        // from the header
+  int32_t findex_type = 0;      // from the header
+  std::vector<Word> words;      // in tree order
+  std::vector<int32_t> leaves;  // non-empty leaves in tree order
   std::vector<int32_t> nodes_per_level{0, 0, 0};
   std::map<int32_t, DecodedNode> nodes;
   std::map<int32_t, std::vector<WordValue>> leaf_values;

@@ -8,8 +8,8 @@
 
 #include "build/findex_files_writer.h"
 #include "findex_decoder.h"
-#include "raised_error.h"
 #include "platform/text_encoding.h"
+#include "raised_error.h"
 #include "shared/exception_family.h"
 #include "shared/mfile.h"
 #include "support/test_support.h"
@@ -41,8 +41,7 @@ std::vector<Entry> LongWords(int count, std::size_t length, int vary = 0) {
 class FindexFilesTest : public ::testing::Test {
  protected:
   FindexWriteCounts Write(const std::vector<Entry>& entries, int32_t flags, int32_t type = 2,
-                          FindexLimits limits = {},
-                          std::function<void(int32_t)> observer = {}) {
+                          FindexLimits limits = {}, std::function<void(int32_t)> observer = {}) {
     test::WriteSortedFile(dir_.Path() + "sorted", entries, flags);
     MFile sorted;
     sorted.OpenFile(dir_.Path() + "sorted", MFile::kReadOnly);
@@ -65,9 +64,10 @@ TEST_F(FindexFilesTest, SmallFindexReadsBackWithEachColumnSet) {
   constexpr int32_t kBig = 2000000000;
   // Entries in the sorted file's order: by value (bytes unsigned), then key.
   const std::vector<Entry> entries = {
-      {std::string("apple"), 3, 2, 1}, {std::string("apple"), 3, 5, 7}, {std::string("apple"), 9, 1, 2},
-      {std::string("bear"), 1, kBig, 1}, {std::string("bear"), 1, kBig, 5}, {std::string("bear"), 2, 4, 3},
-      {std::string("zebra"), 8, 1, 4}, {std::string("\xC3\xA9t\xC3\xA9"), 5, 3, 6}};
+      {std::string("apple"), 3, 2, 1},   {std::string("apple"), 3, 5, 7},
+      {std::string("apple"), 9, 1, 2},   {std::string("bear"), 1, kBig, 1},
+      {std::string("bear"), 1, kBig, 5}, {std::string("bear"), 2, 4, 3},
+      {std::string("zebra"), 8, 1, 4},   {std::string("\xC3\xA9t\xC3\xA9"), 5, 3, 6}};
   for (int32_t flags : {0, 1, 2, 3}) {
     SCOPED_TRACE(flags);
     const FindexWriteCounts counts = Write(entries, flags);
@@ -92,13 +92,19 @@ TEST_F(FindexFilesTest, SmallFindexReadsBackWithEachColumnSet) {
     const auto& apple = findex.words[0].postings;
     const auto& bear = findex.words[1].postings;
     switch (flags) {
-      case 0: EXPECT_EQ(apple, (std::vector<Posting>{{3}, {9}})); break;
+      case 0:
+        EXPECT_EQ(apple, (std::vector<Posting>{{3}, {9}}));
+        break;
       case 1:  // one posting per key, weights summed up to the int32 range
         EXPECT_EQ(apple, (std::vector<Posting>{{3, 7}, {9, 1}}));
         EXPECT_EQ(bear, (std::vector<Posting>{{1, 2147483647}, {2, 4}}));
         break;
-      case 2: EXPECT_EQ(apple, (std::vector<Posting>{{3, 1}, {3, 7}, {9, 2}})); break;
-      case 3: EXPECT_EQ(bear, (std::vector<Posting>{{1, kBig, 1}, {1, kBig, 5}, {2, 4, 3}})); break;
+      case 2:
+        EXPECT_EQ(apple, (std::vector<Posting>{{3, 1}, {3, 7}, {9, 2}}));
+        break;
+      case 3:
+        EXPECT_EQ(bear, (std::vector<Posting>{{1, kBig, 1}, {1, kBig, 5}, {2, 4, 3}}));
+        break;
     }
   }
 }
@@ -138,7 +144,8 @@ TEST_F(FindexFilesTest, EveryLevelOfTheTreeSplitsAndEveryWordIsFoundByDescent) {
   EXPECT_GT(findex.nodes_per_level[1], 1);
   EXPECT_GT(findex.nodes_per_level[2], findex.nodes_per_level[1]);
   EXPECT_GT(findex.leaves.size(), static_cast<std::size_t>(findex.nodes_per_level[2]));
-  EXPECT_EQ(findex.nodes.at(1).children.size(), static_cast<std::size_t>(findex.nodes_per_level[1]) + 1);
+  EXPECT_EQ(findex.nodes.at(1).children.size(),
+            static_cast<std::size_t>(findex.nodes_per_level[1]) + 1);
   for (const auto& word : findex.words) {
     const auto& leaf = findex.leaf_values.at(test::DescendTo(findex, word.value));
     EXPECT_NE(std::find(leaf.begin(), leaf.end(), word.value), leaf.end());
@@ -149,7 +156,8 @@ TEST_F(FindexFilesTest, EveryLevelOfTheTreeSplitsAndEveryWordIsFoundByDescent) {
 
 TEST_F(FindexFilesTest, LongPostingListsGoInBatchesWithTheCountPatchedIn) {
   std::vector<Entry> entries;
-  for (int32_t key = 1; key <= 20000; ++key) entries.push_back(Entry{std::string("many"), key, 1, 0});
+  for (int32_t key = 1; key <= 20000; ++key)
+    entries.push_back(Entry{std::string("many"), key, 1, 0});
   entries.push_back(Entry{std::string("one"), 4, 1, 0});
   std::vector<int32_t> batches;
   Write(entries, 0, 2, {}, [&](int32_t rows) { batches.push_back(rows); });
@@ -172,13 +180,16 @@ TEST_F(FindexFilesTest, TreeAndPostingLimitsRaiseInsteadOfWritingWrongNumbers) {
 
   FindexLimits blocks;
   blocks.max_block_number = 20;
-  EXPECT_NE(test::Raised<CPiFIndexException>([&] { Write(LongWords(300, 400), 0, 2, blocks); }).text
-                .find("would need more than 21 blocks, the most that 16-bit block numbers address"),
-            std::string::npos);
+  EXPECT_NE(
+      test::Raised<CPiFIndexException>([&] {
+        Write(LongWords(300, 400), 0, 2, blocks);
+      }).text.find("would need more than 21 blocks, the most that 16-bit block numbers address"),
+      std::string::npos);
   FindexLimits bytes;
   bytes.max_fst_bytes = 1000;
-  EXPECT_NE(test::Raised<CPiFIndexException>([&] { Write(LongWords(300, 10), 0, 2, bytes); }).text
-                .find("would pass 1000 bytes, the most that 32-bit positions address"),
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+              Write(LongWords(300, 10), 0, 2, bytes);
+            }).text.find("would pass 1000 bytes, the most that 32-bit positions address"),
             std::string::npos);
   // Just within both limits the same data is written whole.
   blocks.max_block_number = 1000;

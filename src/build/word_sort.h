@@ -17,6 +17,8 @@
 
 namespace qm {
 
+class CShareDatabase;
+
 class CPiSort {
  public:
   explicit CPiSort(CGlobalDefs& defs);
@@ -29,6 +31,13 @@ class CPiSort {
   void SortFindexTable(CIndexHeader& definition, MFile& sorted);
 
  private:
+  // Runs the selection's statements in order, each only when the one before
+  // it failed; records the build and update times.
+  void ExecuteSelect(CShareDatabase& database, CIndexHeader& definition);
+  // Decides the findex type from the executed selection's columns, then
+  // runs the row loop: every row into entries of raw. Returns the rows read.
+  int64_t WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHeader& definition);
+
   CGlobalDefs& defs_;
 };
 

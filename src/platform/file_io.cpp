@@ -140,6 +140,13 @@ int64_t SeekFile(int fd, int64_t offset, SeekFrom from) {
 
 bool SyncFileData(int fd) { return ::fdatasync(fd) == 0; }
 
+int TruncateFile(int fd, int64_t size) {
+  while (::ftruncate(fd, static_cast<off_t>(size)) != 0) {
+    if (errno != EINTR) return errno;
+  }
+  return 0;
+}
+
 int RenameFile(const std::string& from, const std::string& to) {
   return ::rename(from.c_str(), to.c_str()) == 0 ? 0 : errno;
 }

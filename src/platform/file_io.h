@@ -90,6 +90,9 @@ int64_t SeekFile(int fd, int64_t offset, SeekFrom from);
 // Pushes written data to the device; false on failure.
 bool SyncFileData(int fd);
 
+// Cuts (or extends with zeros) an open file to size bytes; 0 or the errno.
+int TruncateFile(int fd, int64_t size);
+
 // Each returns 0 or the errno of the failure.
 int RenameFile(const std::string& from, const std::string& to);
 int UnlinkFile(const std::string& path);

@@ -452,6 +452,18 @@ void MFile::SeekToEnd() {
   });
 }
 
+void MFile::Truncate(int64_t size) {
+  Guarded("Truncate", [&] {
+    RequireOpen("Truncate");
+    MCommit();
+    valid_ = position_ = 0;
+    if (size < 0 || platform::TruncateFile(handle_.Get(), size) != 0 ||
+        platform::SeekFile(handle_.Get(), size, platform::SeekFrom::Begin) < 0) {
+      throw CMFileException::General("Truncate");
+    }
+  });
+}
+
 void MFile::TakeOver(MFile& other) {
   Guarded("TakeOver", [&] {
     if (&other == this) return;

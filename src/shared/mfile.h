@@ -95,6 +95,9 @@ class MFile {
   int64_t FileSize(bool commit = true);
   void Seek(int64_t position);
   void SeekToEnd();
+  // Commits pending writes, cuts the file to size bytes and positions there:
+  // a file rewound for writing keeps no bytes of its earlier content.
+  void Truncate(int64_t size);
 
   // Moves other's open file (handle, path, mode and logical position) into
   // this one with a fresh buffer; other is left closed.

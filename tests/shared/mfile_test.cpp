@@ -81,6 +81,23 @@ TEST_F(MFileTest, ReadsWritesSeeksAndTakeOverKeepTheLogicalPosition) {
   EXPECT_EQ(h.GetMode(), MFile::kOpenOrCreate);
 }
 
+TEST_F(MFileTest, TruncateDropsPendingAndOldBytesAndLeavesTheFileThere) {
+  MFile f;
+  f.OpenFile(Path("t"), MFile::kCreate);
+  f.mwrite("abcdefgh", 8);
+  f.Seek(0);
+  char c[2];
+  f.mread(c, 2);   // read-ahead holds the whole file
+  f.mwrite("XY", 2);  // pending: committed before the cut
+  f.Truncate(3);
+  f.mwrite("z", 1);
+  f.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("t")), "abXz");
+  f.Truncate(0);
+  EXPECT_TRUE(f.IsEOF());
+  EXPECT_EQ(f.FileSize(), 0);
+}
+
 TEST_F(MFileTest, EndOfFile) {
   std::string content;
   for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 23));

@@ -2,6 +2,7 @@
 
 #include "build/findex_file_set.h"
 #include "build/findex_files_writer.h"
+#include "build/word_sort.h"
 #include "platform/file_io.h"
 #include "shared/bfile.h"
 #include "shared/exception_family.h"
@@ -105,6 +106,20 @@ void CPiFIndex::Close() {
 const CIndexHeader& CPiFIndex::Header() const {
   if (state_->mode != kModeRead) throw CPiFIndexException::General("Header");
   return state_->header;
+}
+
+void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
+  Guarded("BuildRowFindex", [&] {
+    findex::CheckFindexName(definition.IndexName, "BuildRowFindex");
+    MFile sorted;  // delete-on-close: gone once closed
+    try {
+      CPiSort(defs_).SortFindexTable(definition, sorted);
+    } catch (...) {
+      Trace(true, "PILIB_ERROR.PiFindex.BuildRowFindex", "SortFindexTable failed");
+      throw;
+    }
+    BuildFromSorted(definition, sorted, rebuild);
+  });
 }
 
 void CPiFIndex::BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool rebuild) {

@@ -21,6 +21,7 @@
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 #include "shared/global_defs.h"
+#include "sources/share_database.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -112,6 +113,52 @@ TEST_F(FindexBuildTest, BuildsUnderTheUpperCasedNameAndRebuildsInPlace) {
   findex.Open("Books", 3);
   EXPECT_EQ(findex.Header().ConnectionString, "DSN=Library;UID=u;PWD=p");
   EXPECT_EQ(findex.Header().DisplayName, "LIBRARY");
+}
+
+TEST_F(FindexBuildTest, BuildsFromTableRows) {
+  fs::create_directories(home_.Data() + "Groups/PUBLIC/WorkData");
+  defs_.SetConnectionString("Driver=SQLite3;Database=" + scratch_.Path() + "rows.db;StepAPI=1", "");
+  auto run = [&](const std::string& sql) {
+    CShareDatabase db(defs_);
+    db.Connect();
+    int16_t columns = 0;
+    db.ExecuteSql(sql, columns);
+  };
+  run("CREATE TABLE docs (id INTEGER, body TEXT)");
+  run("INSERT INTO docs VALUES (1, 'alpha beta'), (2, 'beta gamma beta'), (3, NULL)");
+  CIndexHeader definition;
+  definition.IndexName = "Docs";
+  definition.TableName = "docs";
+  definition.KeyColumn = "id";
+  definition.Columns["body"] = {};
+  definition.GeneralFlags = 7;  // scores, positions, default separators
+  definition.LanguageFlags = 0;
+  CPiFIndex(defs_).BuildRowFindex(definition, true);
+  const std::vector<test::Word> words = {{std::string("ALPHA"), {{1, 1, 1}}},
+                                         {std::string("BETA"), {{1, 1, 2}, {2, 1, 1}, {2, 1, 3}}},
+                                         {std::string("GAMMA"), {{2, 1, 2}}}};
+  EXPECT_EQ(Decode("DOCS").words, words);
+  EXPECT_EQ(definition.KeyCount, 3);
+  EXPECT_EQ(definition.SortMax, 3);
+  const std::string sdx = Bytes("DOCS.sdx");
+
+  // A sort that fails leaves the findex and no file behind.
+  definition.SortMax = 0;  // rebuilds read every row
+  definition.TableName = "missing";
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+              CPiFIndex(defs_).BuildRowFindex(definition, true);
+            }).text,
+            "");
+  EXPECT_EQ(Files(), (std::set<std::string>{"DOCS.fst", "DOCS.sdx"}));
+  EXPECT_EQ(Bytes("DOCS.sdx"), sdx);
+  EXPECT_TRUE(fs::is_empty(home_.Data() + "Groups/PUBLIC/WorkData"));
+
+  // Rows that give no word rebuild the findex empty.
+  definition.TableName = "docs";
+  run("UPDATE docs SET body = NULL");
+  CPiFIndex(defs_).BuildRowFindex(definition, true);
+  EXPECT_EQ(Decode("DOCS").block_num, 1);
+  EXPECT_TRUE(Decode("DOCS").words.empty());
 }
 
 TEST_F(FindexBuildTest, BuildsWithoutEntries) {

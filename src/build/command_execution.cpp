@@ -4,6 +4,7 @@
 #include "build/command_translator.h"
 #include "build/command_type.h"
 #include "build/deleted_keys.h"
+#include "build/findex_file_set.h"
 #include "build/findex_files.h"
 #include "build/findex_writer.h"
 #include "locks/lock_manager.h"
@@ -55,7 +56,7 @@ class CommandLock {
 }  // namespace
 
 void RequireNotAddOnName(std::string_view name, const char* method) {
-  if (ToUpper(name).find(kAddOnInfix) != std::string::npos) {
+  if (findex::IsAddOnName(name)) {
     throw CPiStartPointException::Text(
         "Invalid findex name \"%s\": a findex name must not contain \"_ADD_\", which names the "
         "add-on findexes of a findex",
@@ -229,7 +230,7 @@ void CommandExecution::BuildFindex(Command& command) {
       int32_t sort_max = existing.SortMax;
       DateTimeValue max_date_time = existing.MaxDateTimeKey;
       for (int32_t n = 1;; ++n) {
-        const std::string add_on = AddOnName(name, n);
+        const std::string add_on = findex::AddOnName(name, n);
         CIndexHeader add_on_header;
         // An add-on that is not there counts as empty; one that is there but
         // cannot be read is not overwritten.

@@ -1,11 +1,8 @@
-// The names under which a findex's files, add-ons and locks are formed, and
-// reading the header of an existing findex. Findex names are upper-cased
-// whenever a file, add-on or lock name is formed (the search side does the
-// same, and file names are case-sensitive); headers keep the name as written.
+// Reading the header of an existing findex, for the engine's information,
+// existence, option and update calls. File and add-on names are those of the
+// findex file set (build/findex_file_set.h).
 #pragma once
 
-#include <cstdint>
-#include <string>
 #include <string_view>
 
 #include "shared/index_header.h"
@@ -14,14 +11,6 @@ namespace qm {
 
 class CGlobalDefs;
 
-inline constexpr std::string_view kAddOnInfix = "_ADD_";
-
-// name_ADD_n, upper-cased.
-std::string AddOnName(std::string_view name, int32_t n);
-// The index folder of the current group + the upper-cased name + extension
-// (".sdx", ".fst", ".del").
-std::string FindexFilePath(const CGlobalDefs& defs, std::string_view name,
-                           std::string_view extension);
 // True when the findex's word tree or posting file is there.
 bool FindexFilesExist(const CGlobalDefs& defs, std::string_view name);
 

@@ -1,5 +1,6 @@
 #include "build/findex_information.h"
 
+#include "build/findex_file_set.h"
 #include "build/findex_files.h"
 #include "platform/text_encoding.h"
 #include "quillmere/api_enums.h"
@@ -43,7 +44,7 @@ FindexTotals SumWithAddOns(CGlobalDefs& defs, std::string_view name, const CInde
   FindexTotals totals;
   totals.Add(main);
   for (int32_t n = 1;; ++n) {
-    const std::string add_on = AddOnName(name, n);
+    const std::string add_on = findex::AddOnName(name, n);
     if (!FindexFilesExist(defs, add_on)) break;
     try {
       totals.Add(ReadFindexHeaderShared(defs, add_on));

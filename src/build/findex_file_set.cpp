@@ -12,6 +12,7 @@
 #include "shared/exception_family.h"
 #include "shared/file_operations.h"
 #include "shared/global_defs.h"
+#include "shared/plain_name.h"
 #include "shared/trace.h"
 #include "shared/win_file.h"
 
@@ -22,7 +23,6 @@ namespace {
 constexpr const char* kRenameMethod = "RenameIndex";
 constexpr const char* kErrorTag = "PILIB_ERROR.PiFindex.RenameIndex";
 constexpr int kExclusiveAttempts = 3;
-constexpr std::size_t kMaxNameCharacters = 199;
 
 std::mutex g_hook_mutex;
 std::function<bool(const std::string&)> g_rename_hook;
@@ -99,19 +99,7 @@ std::string OwnerName(std::string_view name) {
 }
 
 void CheckFindexName(std::string_view name, const char* method) {
-  std::size_t characters = 0;
-  bool plain = !name.empty() && name != "." && name != "..";
-  for (const char c : name) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte == 0x7F || c == '/' || c == '\\' || c == '"') plain = false;
-    if ((byte & 0xC0) != 0x80) ++characters;
-  }
-  if (!plain || characters > kMaxNameCharacters) {
-    throw CPiFIndexException::Text(
-        "Invalid findex name \"%s\": a name must be 1 to 199 characters without path separators, "
-        "double quotes or control characters",
-        method, nullptr, name);
-  }
+  RequirePlainName<CPiFIndexException>("findex", name, method);
 }
 
 void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::string& temp_sdx,

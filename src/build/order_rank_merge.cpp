@@ -44,12 +44,15 @@ int64_t OrderRankMerge::Run(MFile& sorted, OrderColumnReader* old, OrderColumnWr
   reader.Start(sorted);
   Probe new_value;
   int32_t new_key = 0;
+  int32_t new_row = 0;
   auto next_new = [&] {
     std::size_t size = 0;
     while (const uint8_t* entry = reader.Next(size)) {
-      const int32_t key = SortEntryLayout::RowItem(entry, 0);
-      if (!read.Counts(key, SortEntryLayout::RowItem(entry, 1))) continue;
-      new_key = key;
+      const auto sequence = static_cast<std::size_t>(SortEntryLayout::RowItem(entry, 1));
+      if (sequence >= row_of_sequence.size()) throw CPiOrderSortException::General("MergeColumn");
+      new_row = row_of_sequence[sequence];
+      if (new_row < 0) continue;
+      new_key = SortEntryLayout::RowItem(entry, 0);
       new_value.Set(entry + row_bytes, size - row_bytes);
       return true;
     }
@@ -87,16 +90,20 @@ int64_t OrderRankMerge::Run(MFile& sorted, OrderColumnReader* old, OrderColumnWr
     ++written;
     group_keys.clear();
   };
-  auto add = [&](const Probe& value, int32_t key) {
+  auto add = [&](const Probe& value, int32_t key, int32_t row) {
     if (group_keys.empty() || compare(group_value, value) != 0) {
       flush();
       group_value.Set(value.Value(), value.ValueSize());
       ++rank;
     }
     group_keys.push_back(key);
+    rows.Row(row)[row_column] = rank;
+  };
+  // The row of a key of the old column file.
+  auto old_row = [&](int32_t key) {
     const auto at = std::lower_bound(keys.begin(), keys.end(), key);
     if (at == keys.end() || *at != key) throw CPiOrderSortException::General("MergeColumn");
-    rows.Row(static_cast<int32_t>(at - keys.begin()))[row_column] = rank;
+    return static_cast<int32_t>(at - keys.begin());
   };
 
   bool has_new = next_new();
@@ -110,10 +117,10 @@ int64_t OrderRankMerge::Run(MFile& sorted, OrderColumnReader* old, OrderColumnWr
       take_old = c < 0 || (c == 0 && old_key < new_key);
     }
     if (take_old) {
-      add(old_value, old_key);
+      add(old_value, old_key, old_row(old_key));
       has_old = next_old();
     } else {
-      add(new_value, new_key);
+      add(new_value, new_key, new_row);
       has_new = next_new();
     }
   }

@@ -20,13 +20,15 @@ class ReadKeys;
 struct OrderRankMerge {
   // Entries of the sorted file: row (key, read sequence), then the value.
   const SortEntryLayout& layout;
-  // The keys this build read: an entry counts only if it belongs to the last
-  // row read for its key, and the old column file's keys among them are
+  // The keys this build read: the old column file's keys among them are
   // dropped (their rows were replaced).
   const ReadKeys& read;
   // Every key of the new order, ascending; rows holds one row per key in
   // that order, and the ranks go to its column row_column.
   const std::vector<int32_t>& keys;
+  // Per read sequence, the row of its key, or -1 when a later row read for
+  // the same key counts instead.
+  const std::vector<int32_t>& row_of_sequence;
   CItems& rows;
   int32_t row_column;
 

@@ -32,10 +32,4 @@ bool ReadKeys::Contains(int32_t key) const {
   return it != last_.end() && it->first == key;
 }
 
-bool ReadKeys::Counts(int32_t key, int32_t sequence) const {
-  const auto it = std::lower_bound(last_.begin(), last_.end(), key,
-                                   [](const auto& entry, int32_t k) { return entry.first < k; });
-  return it != last_.end() && it->first == key && it->second == sequence;
-}
-
 }  // namespace qm

@@ -21,8 +21,6 @@ class ReadKeys {
   const std::vector<std::pair<int32_t, int32_t>>& Last() const { return last_; }
   std::size_t Count() const { return last_.size(); }
   bool Contains(int32_t key) const;
-  // True when sequence is the last row read for key.
-  bool Counts(int32_t key, int32_t sequence) const;
 
  private:
   std::vector<std::pair<int32_t, int32_t>> last_;

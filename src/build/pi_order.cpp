@@ -201,7 +201,9 @@ void CPiOrder::BuildOrder(COrderInfo& definition, bool rebuild, bool ranks_only,
     }
 
     OrderSource source(defs_, definition, method);
-    const bool ranks = ranks_only || source.HasTextColumn();
+    // An update keeps the stored order's type 2: its values stay ranks.
+    const bool ranks = ranks_only || source.HasTextColumn() ||
+                       (!rebuild && replaced->OrderType == kOrderTypeRanks);
     const int32_t type = ranks ? kOrderTypeRanks : kOrderTypeValues;
     Build build{definition, rebuild, existing, source, source.Layouts(ranks)};
     Trace(defs_.TraceLevel1(), ranks ? kRanksTag : kValuesTag, "Order Type: %i", type);
@@ -383,14 +385,17 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
   const auto width = static_cast<int32_t>(1 + columns);
   CItems old(width);
   if (!build.rebuild) ReadStoredRows(build.existing.state_->srt, width, old);
-  // Every key of the new order: the stored ones and the ones read.
+  // Every key of the new order: the stored ones and the ones read; and the
+  // row of each read sequence that counts.
   std::vector<int32_t> keys;
   keys.reserve(static_cast<std::size_t>(old.Count()) + read.Count());
+  std::vector<int32_t> row_of_sequence(static_cast<std::size_t>(count), -1);
   {
     int32_t at = 0;
     for (const auto& [key, sequence] : read.Last()) {
       for (; at < old.Count() && old.Key(at) < key; ++at) keys.push_back(old.Key(at));
       if (at < old.Count() && old.Key(at) == key) ++at;
+      row_of_sequence[static_cast<std::size_t>(sequence)] = static_cast<int32_t>(keys.size());
       keys.push_back(key);
     }
     for (; at < old.Count(); ++at) keys.push_back(old.Key(at));
@@ -414,7 +419,8 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
     MFile file;
     file.OpenFile(state_->build->Column(i), MFile::kCreate);
     OrderColumnWriter writer(file);
-    const OrderRankMerge merge{entry_layouts[i], read, keys, out, static_cast<int32_t>(1 + i)};
+    const OrderRankMerge merge{entry_layouts[i], read, keys, row_of_sequence, out,
+                               static_cast<int32_t>(1 + i)};
     const int64_t distinct = merge.Run(sorted, old_column ? &*old_column : nullptr, writer);
     file.MCommit();
     file.Close();

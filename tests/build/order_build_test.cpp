@@ -15,6 +15,7 @@
 #include <map>
 
 #include "build/order_file_set.h"
+#include "locks/lock_manager.h"
 #include "order_file_decoder.h"
 #include "platform/text_encoding.h"
 #include "shared/error_messages.h"
@@ -457,6 +458,33 @@ TEST_P(OrderBuildTest, DamagedOrdersAreRefused) {
   COrderInfo rebuilt = Order("Hurt", t, {"n"});
   Build(rebuilt);
   EXPECT_EQ(RowsOf("HURT"), (Rows{{1, 2}, {2, 3}}));
+}
+
+TEST_P(OrderBuildTest, MovesAndDropsWaitForTheReadersOfTheOrder) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "locks do not depend on the driver";
+  const std::string t = Table("id INTEGER, label VARCHAR(10)");
+  Run("INSERT INTO " + t + " VALUES (1, 'x')");
+  COrderInfo d = Order("Locked", t, {"label"});
+  Build(d);
+  Run("INSERT INTO " + t + " VALUES (2, 'y')");
+  const auto before = Snapshot();
+  CLockManager::ScaleTimeoutsForTesting(0.001);
+  {
+    // A search reading the order holds a reader unit of its kind 3 lock.
+    CLockManager reader("PUBLIC", "locked", kLockOrder);
+    reader.LockReader();
+    EXPECT_EQ(Failure(Order("Locked", t, {"label"}), false),
+              "Could not get exclusive access to order LOCKED to put the new build in place "
+              "(Module:PiOrder,Method:RenameOrder2)");
+    CPiOrder order(home_.Defs());
+    order.OpenOrder("Locked", CPiOrder::kModeRead);
+    EXPECT_THROW(order.DropOrder(), CPiOrderException);
+    EXPECT_EQ(Snapshot(), before);
+  }
+  CLockManager::ScaleTimeoutsForTesting(1.0);
+  COrderInfo update = Order("Locked", t, {"label"});
+  Build(update, false);
+  EXPECT_EQ(ColumnOf("LOCKED", "LABEL"), (Entries{{"x", {1}}, {"y", {2}}}));
 }
 
 }  // namespace

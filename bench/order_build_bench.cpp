@@ -57,7 +57,8 @@ class DataRoot {
     char pattern[] = "/tmp/qm-order-bench.XXXXXX";
     if (mkdtemp(pattern) == nullptr) throw std::runtime_error("cannot make a temporary folder");
     path_ = std::string(pattern) + "/";
-    for (const char* sub : {"Groups/PUBLIC/Config", "Groups/PUBLIC/WorkData", "Groups/PUBLIC/Orders"}) {
+    for (const char* sub :
+         {"Groups/PUBLIC/Config", "Groups/PUBLIC/WorkData", "Groups/PUBLIC/Orders"}) {
       fs::create_directories(path_ + sub);
     }
   }
@@ -219,7 +220,8 @@ int main(int argc, char** argv) {
                 "files MB", "peak MB");
     for (int r = 1; r <= runs; ++r) {
       std::printf("read alone: n,r,d %.2f s; label,n %.2f s\n",
-                  ReadOnly(root, "select id,n,r,d from t"), ReadOnly(root, "select id,label,n from t"));
+                  ReadOnly(root, "select id,n,r,d from t"),
+                  ReadOnly(root, "select id,label,n from t"));
       Print("type 1 (n, r, d)", Build(root, Definition("Values", {"n", "r", "d"}), true));
       Print("type 2 (label, n)", Build(root, Definition("Text", {"label", "n"}), true));
     }

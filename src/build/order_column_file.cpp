@@ -68,7 +68,8 @@ bool OrderColumnReader::Next(std::vector<uint8_t>& value, std::vector<int32_t>& 
 void OrderColumnWriter::Write(std::span<const uint8_t> value, std::span<const int32_t> keys) {
   buffer_.resize(4 + 4 * keys.size());
   bytes::StoreI32(buffer_.data(), static_cast<int32_t>(keys.size()));
-  for (std::size_t i = 0; i < keys.size(); ++i) bytes::StoreI32(buffer_.data() + 4 + 4 * i, keys[i]);
+  for (std::size_t i = 0; i < keys.size(); ++i)
+    bytes::StoreI32(buffer_.data() + 4 + 4 * i, keys[i]);
   file_.WriteData(value.data(), value.size());
   file_.WriteData(buffer_.data(), buffer_.size());
   ++entries_;

@@ -33,7 +33,9 @@ constexpr int32_t kTextOrder = 2;
 std::mutex g_hook_mutex;
 std::function<bool(const std::string&)> g_rename_hook;
 
-std::string OrderFolder(const CGlobalDefs& defs) { return defs.GetFullDataPath(FolderKind::Orders); }
+std::string OrderFolder(const CGlobalDefs& defs) {
+  return defs.GetFullDataPath(FolderKind::Orders);
+}
 
 // NAME_COLUMN: the column file's name without its extension.
 std::string ColumnFileStem(std::string_view name, std::string_view column) {
@@ -123,8 +125,8 @@ void CheckColumnFilesFree(const CGlobalDefs& defs, std::string_view name,
     const std::string stem = ColumnFileStem(name, column.Name);
     if (!stems.insert(stem).second) {
       throw CPiOrderException::Text(
-          "Order %s names column %s twice: both would be stored in the column file %s.col",
-          method, nullptr, name, column.Name, stem);
+          "Order %s names column %s twice: both would be stored in the column file %s.col", method,
+          nullptr, name, column.Name, stem);
     }
     // Every other cut of the stem at a "_" into an order name and a column
     // name could be another order's column file.
@@ -158,8 +160,8 @@ BuildFiles::BuildFiles(const CGlobalDefs& defs, std::size_t columns) {
   std::string base;
   for (int attempt = 1;; ++attempt) {
     base = folder + SLGetTempFileName(defs, true, kTempCaller);
-    platform::FileHandle file = platform::OpenFileAs(
-        base + ".sri.tmp", platform::FileAccess::Write, platform::FileDisposition::CreateNew);
+    platform::FileHandle file = platform::OpenFileAs(base + ".sri.tmp", platform::FileAccess::Write,
+                                                     platform::FileDisposition::CreateNew);
     if (file.IsOpen()) break;
     if (errno != EEXIST) {
       throw CPiOrderException::Text(kOpenFailureText, kMethod, nullptr, base + ".sri.tmp");
@@ -170,7 +172,8 @@ BuildFiles::BuildFiles(const CGlobalDefs& defs, std::size_t columns) {
   }
   sri_ = base + ".sri.tmp";
   srt_ = base + ".srt.tmp";
-  for (std::size_t i = 0; i < columns; ++i) columns_.push_back(base + "_" + std::to_string(i + 1) + ".tmp");
+  for (std::size_t i = 0; i < columns; ++i)
+    columns_.push_back(base + "_" + std::to_string(i + 1) + ".tmp");
 }
 
 BuildFiles::~BuildFiles() {
@@ -228,7 +231,8 @@ void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo&
   DropFile(paths.sri);
   DropFile(paths.srt);
   if (info.OrderType == kTextOrder) {
-    for (const OrderColumn& column : info.Columns) DropFile(ColumnFilePath(defs, name, column.Name));
+    for (const OrderColumn& column : info.Columns)
+      DropFile(ColumnFilePath(defs, name, column.Name));
   }
 }
 

@@ -34,8 +34,7 @@ struct OrderPaths {
 
 OrderPaths PathsOf(const CGlobalDefs& defs, std::string_view name);
 // NAME_COLUMN.col in the order folder.
-std::string ColumnFilePath(const CGlobalDefs& defs, std::string_view name,
-                           std::string_view column);
+std::string ColumnFilePath(const CGlobalDefs& defs, std::string_view name, std::string_view column);
 
 // Names reach file and lock names: the order name and every column name must
 // be plain names, and a column list must not be empty. Raises a PiOrder error

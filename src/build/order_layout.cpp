@@ -16,9 +16,7 @@ void EncodeOrderSlots(const CValue& value, std::span<int32_t> slots) {
       slots[0] = static_cast<int32_t>(value.DateKey());
       slots[1] = static_cast<int32_t>(value.TimeKey());
       return;
-    default:
-      slots[0] = value.GetInteger();
-      return;
+    default: slots[0] = value.GetInteger(); return;
   }
 }
 

@@ -37,7 +37,9 @@ class Probe {
 int64_t OrderRankMerge::Run(MFile& sorted, OrderColumnReader* old, OrderColumnWriter& out) const {
   const SortEntryLayout probes(1, layout.Type());
   const std::size_t row_bytes = 4 * static_cast<std::size_t>(layout.RowWidth());
-  auto compare = [&](const Probe& a, const Probe& b) { return probes.Compare(a.Entry(), b.Entry()); };
+  auto compare = [&](const Probe& a, const Probe& b) {
+    return probes.Compare(a.Entry(), b.Entry());
+  };
 
   // The new side: entries of the rows that count.
   SortFileReader reader(layout);

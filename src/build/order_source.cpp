@@ -51,7 +51,9 @@ struct OrderSource::Plan {
 };
 
 OrderSource::OrderSource(CGlobalDefs& defs, const COrderInfo& definition, const char* method)
-    : defs_(defs), source_(defs), sort_max_(definition.SortMax),
+    : defs_(defs),
+      source_(defs),
+      sort_max_(definition.SortMax),
       max_date_key_(definition.MaxDateTimeKey) {
   // The connection stored with the order serves when the caller set none;
   // the caller's settings stay as they are.
@@ -126,7 +128,9 @@ std::vector<OrderColumnLayout> OrderSource::Layouts(bool ranks) const {
 int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, const char* method) {
   CShareDatabase& db = *database_;
   const Plan& plan = *plan_;
-  auto row_error = [&](const char* text) { return CPiOrderSortException::Text(text, method, nullptr); };
+  auto row_error = [&](const char* text) {
+    return CPiOrderSortException::Text(text, method, nullptr);
+  };
   db.AllocateCache();
   std::vector<CValue> values(plan.columns.size());
   std::vector<const CValue*> present(plan.columns.size());
@@ -151,14 +155,15 @@ int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, co
     int32_t key = 0;
     int result = CShareDatabase::kValueRead;
     try {
-      result = db.GetColumnValueFromCache(plan.key_index, plan.key_type == VALUE_TYPE::Double
-                                                              ? VALUE_TYPE::Double
-                                                              : VALUE_TYPE::Integer,
-                                          key_value);
+      result = db.GetColumnValueFromCache(
+          plan.key_index,
+          plan.key_type == VALUE_TYPE::Double ? VALUE_TYPE::Double : VALUE_TYPE::Integer,
+          key_value);
     } catch (const CShareDatabaseException&) {
       throw row_error("Unique key is not numeric");
     }
-    if (result == CShareDatabase::kValueNull) throw row_error("Unique key column contains NULL values");
+    if (result == CShareDatabase::kValueNull)
+      throw row_error("Unique key column contains NULL values");
     if (plan.key_type == VALUE_TYPE::Double) {
       const double d = key_value.GetDouble();
       if (!std::isfinite(d) || d != std::trunc(d) || !DoubleToInteger32(d, key)) {
@@ -193,7 +198,8 @@ int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, co
     visit(key, present);
     db.CleanCacheColumns();
     ++rows;
-    if (rows % kRowTraceStep == 0) Trace(defs_.TraceLevel1(), trace_tag, "------ Reading row %i\n", rows);
+    if (rows % kRowTraceStep == 0)
+      Trace(defs_.TraceLevel1(), trace_tag, "------ Reading row %i\n", rows);
     if (db.MoveNext() != CShareDatabase::kRowFetched) break;
   }
   max_date_key_ = max_date.GetDateTime();

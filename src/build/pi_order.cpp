@@ -45,7 +45,7 @@ decltype(auto) GuardOrder(const char* method, Body&& body) {
 template <class Body>
 decltype(auto) GuardSort(const char* method, Body&& body) {
   return Guard<CPiOrderSortException, CPiOrderSortUnknownException>(method,
-                                                                     std::forward<Body>(body));
+                                                                    std::forward<Body>(body));
 }
 
 // An update merges its rows with values prepared the stored order's way, so
@@ -160,8 +160,8 @@ void CPiOrder::OpenOrder(std::string_view name, int32_t mode, std::size_t column
       }
     } else {
       throw CPiOrderException::Text(
-          "Unknown order mode %i: orders open for reading (3) or for a build (1)", kMethod,
-          nullptr, mode);
+          "Unknown order mode %i: orders open for reading (3) or for a build (1)", kMethod, nullptr,
+          mode);
     }
     state_->name = std::string(name);
     state_->mode = mode;
@@ -229,8 +229,7 @@ void CPiOrder::BuildOrder(COrderInfo& definition, bool rebuild, bool ranks_only,
     definition.SortMax = source.SortMax();
     definition.MaxDateTimeKey = source.MaxDateTimeKey();
     definition.LastUpdateTime = source.StartTime();
-    definition.BuildTime =
-        rebuild || !replaced ? source.StartTime() : replaced->BuildTime;
+    definition.BuildTime = rebuild || !replaced ? source.StartTime() : replaced->BuildTime;
     definition.ConnectionString =
         (definition.GeneralFlags & kSaveConnectionFlag) != 0 ? source.ConnectionString() : "";
     definition.DisplayName = source.DisplayName();
@@ -311,8 +310,9 @@ bool CPiOrder::BuildValues(Build& build, CItems& out, const char* method) {
       out.InsertItem(std::span<const int32_t>(old.Row(at), static_cast<std::size_t>(width)));
     }
     if (at < old.Count() && old.Key(at) == key) ++at;
-    out.InsertItem(std::span<const int32_t>(read_rows.data() + static_cast<std::size_t>(sequence) * width,
-                                            static_cast<std::size_t>(width)));
+    out.InsertItem(
+        std::span<const int32_t>(read_rows.data() + static_cast<std::size_t>(sequence) * width,
+                                 static_cast<std::size_t>(width)));
   }
   for (; at < old.Count(); ++at) {
     out.InsertItem(std::span<const int32_t>(old.Row(at), static_cast<std::size_t>(width)));
@@ -325,8 +325,7 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
   const std::vector<OrderColumnLayout>& layouts = build.layouts;
   COrderInfo& definition = build.definition;
   const std::size_t columns = layouts.size();
-  order_files::CheckColumnFilesFree(defs_, definition.OrderName, definition.Columns,
-                                    kRanksMethod);
+  order_files::CheckColumnFilesFree(defs_, definition.OrderName, definition.Columns, kRanksMethod);
 
   Trace(defs_.TraceLevel1(), kRanksTag,
         "----- Splitting collumns and sorting words, this may take a while.\n");
@@ -365,9 +364,15 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
               text.Prepare(wide);
               entry_layouts[i].AppendText(entry, std::u16string_view(wide));
               break;
-            case VALUE_TYPE::Integer: SortEntryLayout::AppendInteger(entry, value->GetInteger()); break;
-            case VALUE_TYPE::Double: SortEntryLayout::AppendDouble(entry, value->GetDouble()); break;
-            case VALUE_TYPE::DateTime: SortEntryLayout::AppendDate(entry, value->GetDateTime()); break;
+            case VALUE_TYPE::Integer:
+              SortEntryLayout::AppendInteger(entry, value->GetInteger());
+              break;
+            case VALUE_TYPE::Double:
+              SortEntryLayout::AppendDouble(entry, value->GetDouble());
+              break;
+            case VALUE_TYPE::DateTime:
+              SortEntryLayout::AppendDate(entry, value->GetDateTime());
+              break;
           }
           writers[i].Put(entry.data(), entry.size());
         }
@@ -376,7 +381,8 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
   for (SortFileWriter& writer : writers) writer.Finish();
   defs_.SetProgress(15);
   if (count == 0) {
-    if (build.rebuild) throw CPiOrderSortException::Numbered(kNoRowsSelected, kRanksMethod, nullptr);
+    if (build.rebuild)
+      throw CPiOrderSortException::Numbered(kNoRowsSelected, kRanksMethod, nullptr);
     return false;
   }
 
@@ -419,8 +425,8 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
     MFile file;
     file.OpenFile(state_->build->Column(i), MFile::kCreate);
     OrderColumnWriter writer(file);
-    const OrderRankMerge merge{entry_layouts[i], read, keys, row_of_sequence, out,
-                               static_cast<int32_t>(1 + i)};
+    const OrderRankMerge merge{entry_layouts[i], read, keys,
+                               row_of_sequence,  out,  static_cast<int32_t>(1 + i)};
     const int64_t distinct = merge.Run(sorted, old_column ? &*old_column : nullptr, writer);
     file.MCommit();
     file.Close();

@@ -3,8 +3,6 @@
 // drivers): the files of type 1 and type 2 orders read back with the
 // decoder of order_file_decoder.h, updates, refusals, drops, and what
 // failures leave behind.
-#include "build/pi_order.h"
-
 #include <gtest/gtest.h>
 #include <unistd.h>
 
@@ -15,6 +13,7 @@
 #include <map>
 
 #include "build/order_file_set.h"
+#include "build/pi_order.h"
 #include "locks/lock_manager.h"
 #include "order_file_decoder.h"
 #include "platform/text_encoding.h"
@@ -37,7 +36,9 @@ using Entries = std::vector<test::ColumnEntry>;
 
 int32_t DateKey(int y, int m, int d) { return (y * 256 + m) * 256 + d; }
 int32_t TimeKey(int h, int m, int s) { return (h * 256 + m) * 256 + s; }
-int32_t Low(double v) { return static_cast<int32_t>(static_cast<uint32_t>(std::bit_cast<uint64_t>(v))); }
+int32_t Low(double v) {
+  return static_cast<int32_t>(static_cast<uint32_t>(std::bit_cast<uint64_t>(v)));
+}
 int32_t High(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v) >> 32); }
 
 class OrderBuildTest : public ::testing::TestWithParam<Source> {
@@ -50,7 +51,8 @@ class OrderBuildTest : public ::testing::TestWithParam<Source> {
           "Driver=SQLite3;Database=" + home_.Data() + "rows.db;StepAPI=1", "test");
       return;
     }
-    const char* name = GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
+    const char* name =
+        GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
     const char* connection = std::getenv(name);
     if (connection == nullptr || *connection == '\0') {
       GTEST_SKIP() << name << " is not set: run through scripts/test, which starts PostgreSQL";
@@ -135,7 +137,8 @@ class OrderBuildTest : public ::testing::TestWithParam<Source> {
   Entries ColumnOf(const std::string& order, const std::string& column) {
     const test::OrderHeader h = test::DecodeOrderHeader(File(order + ".sri"));
     for (const auto& c : h.columns) {
-      if (ToUpper(c.name) == column) return test::DecodeColumnFile(File(order + "_" + column + ".col"), c.type);
+      if (ToUpper(c.name) == column)
+        return test::DecodeColumnFile(File(order + "_" + column + ".col"), c.type);
     }
     ADD_FAILURE() << "no column " << column;
     return {};
@@ -195,8 +198,8 @@ TEST_P(OrderBuildTest, TextOrdersStoreDistinctPreparedValuesAndRanksNumbersSortA
   d.IgnoreChars = u"-";
   Build(d);
 
-  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"NAMES.sri", "NAMES.srt", "NAMES_LABEL.col",
-                                                    "NAMES_N.col"}));
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"NAMES.sri", "NAMES.srt", "NAMES_LABEL.col", "NAMES_N.col"}));
   const test::OrderHeader h = test::DecodeOrderHeader(File("NAMES.sri"));
   EXPECT_EQ(h.type, 2);
   EXPECT_EQ(h.count, 5);
@@ -241,7 +244,8 @@ TEST_P(OrderBuildTest, UpdatesReadLaterRowsAndReplaceTheRowsOfKeysReadAgain) {
   Build(counts);
   EXPECT_EQ(ColumnOf("WORDS", "LABEL"), (Entries{{"apple", {2}}, {"fig", {3}}, {"pear", {1}}}));
 
-  Run("UPDATE " + t + " SET label = 'zucchini', n = 50, changed = '2024-01-02 09:00:00' WHERE id = 1");
+  Run("UPDATE " + t +
+      " SET label = 'zucchini', n = 50, changed = '2024-01-02 09:00:00' WHERE id = 1");
   Run("INSERT INTO " + t + " VALUES (4, 'apple', 1, '2024-01-02 09:30:00')");
   // Not read again: its change time is not later.
   Run("UPDATE " + t + " SET label = 'kiwi', n = 0 WHERE id = 3");
@@ -297,7 +301,8 @@ TEST_P(OrderBuildTest, DropOrderRemovesEveryFile) {
 }
 
 TEST_P(OrderBuildTest, UpdatesThatChangeTheDefinitionAreRefusedUnlessRebuilt) {
-  if (GetParam() != Source::SQLite) GTEST_SKIP() << "the definition check does not depend on the driver";
+  if (GetParam() != Source::SQLite)
+    GTEST_SKIP() << "the definition check does not depend on the driver";
   const std::string t = Table("id INTEGER, label VARCHAR(10), n INTEGER, r DOUBLE PRECISION");
   Run("INSERT INTO " + t + " VALUES (1, 'x', 2, 0.5)");
   COrderInfo d = Order("Shape", t, {"n"});
@@ -316,8 +321,8 @@ TEST_P(OrderBuildTest, UpdatesThatChangeTheDefinitionAreRefusedUnlessRebuilt) {
   // Rebuilds take any definition; the column files of the old one go.
   COrderInfo text = Order("Shape", t, {"label", "n"});
   Build(text);
-  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"SHAPE.sri", "SHAPE.srt", "SHAPE_LABEL.col",
-                                                    "SHAPE_N.col"}));
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"SHAPE.sri", "SHAPE.srt", "SHAPE_LABEL.col", "SHAPE_N.col"}));
   COrderInfo fewer = Order("Shape", t, {"n", "label"});
   fewer.Columns.pop_back();
   fewer.Columns.push_back(OrderColumn{"r", {}});
@@ -391,15 +396,16 @@ TEST_P(OrderBuildTest, NamesThatBecomeFileNamesAreChecked) {
   Build(a);
   // A_B with column c would write A_B_C.col, which is order A's column b_c.
   const std::string taken = Failure(Order("A_B", t, {"c"}));
-  EXPECT_EQ(taken.find("The column file A_B_C.col of order A_B, column c, belongs to order A, column b_c"),
+  EXPECT_EQ(taken.find(
+                "The column file A_B_C.col of order A_B, column c, belongs to order A, column b_c"),
             0u)
       << taken;
   COrderInfo values = Order("A_B", t, {"n"});  // no column files: no collision
   Build(values);
   const std::string twice = Failure(Order("Twice", t, {"c", "C"}));
   EXPECT_NE(twice.find("names column C twice"), std::string::npos) << twice;
-  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"A.sri", "A.srt", "A_B.sri", "A_B.srt",
-                                                    "A_B_C.col"}));
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"A.sri", "A.srt", "A_B.sri", "A_B.srt", "A_B_C.col"}));
 }
 
 TEST_P(OrderBuildTest, AKeyReadTwiceKeepsTheLastRowReadForIt) {
@@ -434,7 +440,8 @@ TEST_P(OrderBuildTest, DamagedOrdersAreRefused) {
   // A row file whose size does not agree with its count.
   std::string rows = test::ReadFile(File("HURT.srt"));
   test::WriteFile(File("HURT.srt"), rows + "xx");
-  EXPECT_NE(Failure(Order("Hurt", t, {"n"}), false).find("Order file is damaged"), std::string::npos);
+  EXPECT_NE(Failure(Order("Hurt", t, {"n"}), false).find("Order file is damaged"),
+            std::string::npos);
   // A column file that ends inside an entry.
   std::string column = test::ReadFile(File("TEXT_LABEL.col"));
   test::WriteFile(File("TEXT_LABEL.col"), column.substr(0, column.size() - 2));

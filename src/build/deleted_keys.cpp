@@ -15,6 +15,7 @@
 #include "shared/exception_family.h"
 #include "shared/file_operations.h"
 #include "shared/global_defs.h"
+#include "shared/plain_name.h"
 #include "shared/win_file.h"
 
 namespace qm {
@@ -32,20 +33,7 @@ std::function<void(const std::string&)> g_replace_hook;
 // Names reach a file name and a lock name: nothing that could leave the
 // Indexes folder or be no file name at all.
 void RequireFileName(std::string_view name, const char* method) {
-  const char* fault = nullptr;
-  if (name.empty()) {
-    fault = "empty";
-  } else if (name == "." || name == "..") {
-    fault = "not a file name";
-  } else if (name.find_first_of("/\\") != std::string_view::npos) {
-    fault = "contains a path separator";
-  } else if (std::any_of(name.begin(), name.end(),
-                         [](char c) { return static_cast<unsigned char>(c) < 0x20; })) {
-    fault = "contains a control character";
-  }
-  if (fault != nullptr) {
-    throw CPiDeleteException::Text("Invalid findex name \"%s\": %s", method, nullptr, name, fault);
-  }
+  RequirePlainName<CPiDeleteException>("findex", name, method);
 }
 
 // --- the byte layout: count, then count keys ascending, all signed 32-bit LE ---

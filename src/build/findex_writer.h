@@ -13,6 +13,7 @@
 
 #include "shared/global_defs.h"
 #include "shared/index_header.h"
+#include "shared/mfile.h"
 
 namespace qm {
 
@@ -27,20 +28,31 @@ class CPiFIndex {
   CPiFIndex& operator=(const CPiFIndex&) = delete;
 
   // Mode 3 opens an existing findex read-only and reads its header; a missing
-  // findex raises. (Names are upper-cased when file names are formed.)
+  // findex raises. Mode 4 takes a temporary name in the index folder for a
+  // build (its files are removed by Close unless moved into place). Other
+  // modes would truncate a findex and are refused. Names are upper-cased when
+  // file names are formed and must be plain names.
   void Open(std::string_view name, int32_t mode);
   bool IsOpen() const;
   void Close();
-  // The header read by Open (mode other than 1 and 4).
+  // The header read by Open in mode 3.
   const CIndexHeader& Header() const;
 
   // Sorts the rows of definition's SELECT (from definition.SortMax on, for an
   // update), writes the word tree and postings under temporary names and moves
   // them into place under the findex name of the definition.
   void BuildRowFindex(CIndexHeader& definition, bool rebuild);
+  // The second half of BuildRowFindex: writes the findex of the sorted entry
+  // file (read from its current position; see build/word_sort.h) under
+  // temporary names and moves it into place; progress 100 at the end. No
+  // entry writes a findex without words (BlockNum 1) for a rebuild; an update
+  // without entries leaves the findex as it was. On failure only the
+  // temporary files were touched, and they are gone.
+  void BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool rebuild);
 
   // Removes the open findex with its add-ons and deleted-key file; an add-on
-  // name ("_ADD_") raises error 44.
+  // name ("_ADD_") raises error 44. REQUIRES: the caller holds the exclusive
+  // kind 2 and kind 1 locks of the findex (DROP FINDEX takes them).
   void DropFindex();
 
  private:

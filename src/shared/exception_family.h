@@ -63,6 +63,8 @@ QM_EXCEPTION_MODULE_WITH_UNKNOWN(ComConverter, "ComConverter", detail::kEngineTr
 QM_EXCEPTION_MODULE_WITH_UNKNOWN(Connection, "Connection", detail::kConverterTraceModules)
 QM_EXCEPTION_MODULE_WITH_UNKNOWN(Converter, "Converter", detail::kConverterTraceModules)
 QM_EXCEPTION_MODULE(LockManager, "LockManager", detail::kEngineTraceModules)
+// The API objects: argument and remote-access failures.
+QM_EXCEPTION_MODULE(PiCom, "PiCom", detail::kEngineTraceModules)
 
 // The result-set module writes its unknown-exception line under a tag of its own.
 struct GiTreeRowsetModule {

@@ -1,0 +1,181 @@
+// The command object's error model and argument rules: result codes, the
+// thread's error information, VARIANT_BOOL readings, null texts, and the
+// calls that need a remote server.
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <thread>
+
+#include "api/command_fixture.h"
+#include "shared/exception_family.h"
+
+namespace qm {
+namespace {
+
+using test::CommandFixture;
+
+class CommandObjectTest : public CommandFixture {
+ protected:
+  // Polls until no background job runs (GetProgress 100).
+  void WaitForJob() {
+    for (int i = 0; i < 60000 && Progress() != 100; ++i) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    }
+    ASSERT_EQ(Progress(), 100) << "the background job did not end";
+  }
+
+  std::string GeneralOption(int32_t option) {
+    BSTR text = u"untouched";
+    EXPECT_EQ(command_->GetIndexGeneralOption(option, VARIANT_TRUE, &text), S_OK) << LastError();
+    return Utf16ToUtf8(text);
+  }
+};
+
+TEST_F(CommandObjectTest, FailureLeavesTextAndSourceInTheThreadsErrorInfoAndTrace) {
+  ASSERT_EQ(command_->ExecuteEx(T("DROP THING x"), VARIANT_TRUE), DISP_E_EXCEPTION);
+  ErrorInfo info;
+  ASSERT_TRUE(GetErrorInfo(info));
+  EXPECT_EQ(Utf16ToUtf8(info.Description),
+            "Command not recognised (Module:PiStartPoint,Method:ExecuteW)\r\n");
+  EXPECT_EQ(info.Source, u"QuillmereAPI.APICommand.1");
+  EXPECT_TRUE(info.HelpFile.empty());
+  EXPECT_EQ(info.HelpContext, 0u);
+  EXPECT_FALSE(GetErrorInfo(info)) << "reading the error information takes it";
+
+  // Written whatever the trace level, in the APICommand trace file.
+  bool found = false;
+  for (const auto& entry : std::filesystem::directory_iterator(home_.Home() + "Log/")) {
+    if (entry.path().filename().string().rfind("trace_APICommand_", 0) == 0) {
+      found = test::ReadFile(entry.path().string()).find(" - Command not recognised") !=
+              std::string::npos;
+    }
+  }
+  EXPECT_TRUE(found) << TraceText();
+
+  // The error information belongs to the thread that failed.
+  ASSERT_EQ(command_->ExecuteEx(T("DROP THING x"), VARIANT_TRUE), DISP_E_EXCEPTION);
+  std::thread([] {
+    ErrorInfo other;
+    EXPECT_FALSE(GetErrorInfo(other));
+  }).join();
+  EXPECT_FALSE(LastError().empty());
+}
+
+TEST_F(CommandObjectTest, ReportErrorJoinsTheMessagesUpToLevel100) {
+  const auto cause = CPiCmdException::Numbered(13, "TranslateW", nullptr);
+  const auto wrapper = CPiStartPointException::General("ExecuteW", &cause);
+  EXPECT_EQ(command_->ReportError(wrapper), DISP_E_EXCEPTION);
+  // The general wrapper (level 200) is left out, the numbered cause is shown.
+  const std::string text = LastError();
+  EXPECT_EQ(text.rfind("Syntax error in the command statement", 0), 0u) << text;
+  EXPECT_EQ(text.find("General Error"), std::string::npos) << text;
+
+  // A chain with nothing at level 100 or below still says something.
+  EXPECT_EQ(command_->ReportError(CPiStartPointException::General("ExecuteW")), DISP_E_EXCEPTION);
+  EXPECT_EQ(LastError(), "General Error (Module:PiStartPoint,Method:ExecuteW)\r\n");
+
+  EXPECT_EQ(command_->ReportError(std::u16string(u"plain text")), DISP_E_EXCEPTION);
+  EXPECT_EQ(LastError(), "plain text");
+}
+
+TEST_F(CommandObjectTest, OnlyMinusOneMakesExecuteBlock) {
+  const char* failing = "UPDATE FINDEX Missing";
+  EXPECT_EQ(command_->ExecuteEx(T(failing), VARIANT_TRUE), DISP_E_EXCEPTION);
+  EXPECT_FALSE(LastError().empty());
+
+  for (const VARIANT_BOOL blocking : {VARIANT_BOOL{1}, VARIANT_BOOL{0}, VARIANT_BOOL{-2}}) {
+    EXPECT_EQ(command_->ExecuteEx(T(failing), blocking), S_OK) << blocking;
+    EXPECT_EQ(LastError(), "");
+    WaitForJob();
+    EXPECT_EQ(ErrorNumber(), 1);
+    EXPECT_FALSE(ErrorMsg().empty());
+  }
+  // Execute passes 1: background as well.
+  EXPECT_EQ(command_->Execute(T(failing)), S_OK);
+  WaitForJob();
+  EXPECT_EQ(ErrorNumber(), 1);
+}
+
+TEST_F(CommandObjectTest, OtherMethodsTakeAnyNonZeroAsTrue) {
+  ASSERT_EQ(command_->SetIndexGeneralOptions(2, 0, 0, nullptr, 0, 0), S_OK);
+  EXPECT_EQ(GeneralOption(igoSupportScore), "1");
+  EXPECT_EQ(GeneralOption(igoSupportPhrases), "0");
+  ASSERT_EQ(command_->SetIndexGeneralOptions(0, 1, 0, nullptr, 0, -3), S_OK);
+  EXPECT_EQ(GeneralOption(igoSupportScore), "0");
+  EXPECT_EQ(GeneralOption(igoSupportPhrases), "1");
+  EXPECT_EQ(GeneralOption(igoSaveDatabaseConnection), "1");
+
+  // GetDefaultValue 7 reads the current options; 0 the stored ones, which
+  // need a findex named by the current object name.
+  BSTR text;
+  EXPECT_EQ(command_->GetIndexGeneralOption(igoSupportPhrases, 7, &text), S_OK);
+  EXPECT_EQ(text, u"1");
+  EXPECT_EQ(command_->GetIndexGeneralOption(igoSupportPhrases, 0, &text), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("Invalid object name \"\""), std::string::npos);
+
+  // CreateFindexEx with Blocking 1 blocks: the failure comes back at once.
+  EXPECT_EQ(command_->CreateFindexEx(T("Books"), T("select id, t from no_such_table"), T("t"),
+                                     T("id"), 1, nullptr),
+            DISP_E_EXCEPTION);
+  EXPECT_FALSE(LastError().empty());
+  EXPECT_EQ(command_->CreateFindexEx(T("Books"), T("select id, t from no_such_table"), T("t"),
+                                     T("id"), 0, nullptr),
+            S_OK);
+  WaitForJob();
+  EXPECT_EQ(ErrorNumber(), 1);
+}
+
+TEST_F(CommandObjectTest, NullTextsAndNullResults) {
+  // A null separators text leaves the separators; an empty one clears them.
+  ASSERT_EQ(command_->SetIndexGeneralOptions(0, -1, 0, T(u"; "), -1, -1), S_OK);
+  ASSERT_EQ(command_->SetIndexGeneralOptions(0, -1, 0, nullptr, -1, -1), S_OK);
+  EXPECT_EQ(GeneralOption(igoSeparators), ";<SPACE>");
+  ASSERT_EQ(command_->SetIndexGeneralOptions(0, -1, 0, T(u""), -1, -1), S_OK);
+  EXPECT_EQ(GeneralOption(igoSeparators), "");
+
+  // A null group is an empty name, which is refused.
+  EXPECT_EQ(command_->SetGroup(nullptr), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("Invalid group name \"\": a name must not be empty"),
+            std::string::npos);
+
+  EXPECT_EQ(command_->GetProgress(nullptr), DISP_E_EXCEPTION);
+  EXPECT_EQ(LastError(),
+            "The result argument of GetProgress is a null pointer "
+            "(Module:PiCom,Method:GetProgress)\r\n");
+  EXPECT_EQ(command_->GetFindexInfo(idxKeyName, nullptr), DISP_E_EXCEPTION);
+}
+
+TEST_F(CommandObjectTest, RemoteCallsFailClearlyAndTheObjectStaysLocal) {
+  EXPECT_EQ(command_->ConnectToServer(T("search.example")), DISP_E_EXCEPTION);
+  EXPECT_EQ(LastError(),
+            "Remote Quillmere Search servers are not available in this build: cannot connect "
+            "to search.example (Module:PiCom,Method:ConnectToServer)\r\n");
+  EXPECT_EQ(command_->DisconnectFromServer(), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("not available in this build"), std::string::npos);
+  EXPECT_EQ(command_->PushIndex(T("Books")), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("the findex Books"), std::string::npos);
+  EXPECT_EQ(command_->PushOrder(T("Titles")), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("the order Titles"), std::string::npos);
+
+  // Local calls go on working.
+  BSTR version;
+  ASSERT_EQ(command_->GetVersion(&version), S_OK);
+  EXPECT_EQ(version, u"6.14");
+  EXPECT_EQ(Run("DROP THING x").rfind("Command not recognised", 0), 0u);
+}
+
+TEST_F(CommandObjectTest, CallsWithoutEffect) {
+  ASSERT_EQ(command_->SetIndexLanguageOptions(lngGerman, -1, 0, 0, 0, 0), S_OK);
+  EXPECT_EQ(command_->SystemOverwrite(T("anything at all")), S_OK);
+  EXPECT_EQ(command_->SystemOverwrite(nullptr), S_OK);
+  EXPECT_EQ(command_->SetProcessRights(), S_OK);
+  BSTR text;
+  ASSERT_EQ(command_->GetIndexLanguageOption(iloLanguage, -1, &text), S_OK);
+  EXPECT_EQ(text, u"7");
+  ASSERT_EQ(command_->GetIndexLanguageOption(iloUseStemming, -1, &text), S_OK);
+  EXPECT_EQ(text, u"1");
+  EXPECT_EQ(LastError(), "");
+}
+
+}  // namespace
+}  // namespace qm

@@ -1,0 +1,352 @@
+// Findex builds in a data directory: files under upper-cased names, rebuilds
+// and add-on updates, builds without entries, failures that leave the old
+// findex and no temporary file, drops, and readers during rebuilds.
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <chrono>
+#include <filesystem>
+#include <functional>
+#include <set>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "build/findex_file_set.h"
+#include "build/findex_files_writer.h"
+#include "build/findex_writer.h"
+#include "findex_decoder.h"
+#include "locks/lock_manager.h"
+#include "raised_error.h"
+#include "shared/error_messages.h"
+#include "shared/exception_family.h"
+#include "shared/global_defs.h"
+#include "sources/share_database.h"
+#include "support/test_support.h"
+
+namespace qm {
+namespace {
+
+namespace fs = std::filesystem;
+using test::Entry;
+
+std::vector<Entry> Words(const std::string& prefix, int count, std::size_t length = 8) {
+  std::vector<Entry> entries;
+  for (int i = 0; i < count; ++i) {
+    std::string word = prefix + std::to_string(100000 + i);
+    word.resize(std::max(word.size(), length), 'q');
+    entries.push_back(Entry{word, i + 1, 2, 1});
+    entries.push_back(Entry{word, i + 7, 1, 3});
+  }
+  return entries;
+}
+
+class FindexBuildTest : public ::testing::Test {
+ protected:
+  FindexBuildTest() {
+    fs::create_directories(Indexes());
+    fs::create_directories(home_.Data() + "Groups/PUBLIC/Config");
+    LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini");
+  }
+  ~FindexBuildTest() override {
+    SetFindexLimitsForTesting({});
+    findex::SetRenameHookForTesting({});
+    CLockManager::ScaleTimeoutsForTesting(1.0);
+  }
+
+  std::string Indexes() const { return home_.Data() + "Groups/PUBLIC/Indexes/"; }
+  void Build(const std::string& name, const std::vector<Entry>& entries, bool rebuild,
+             int32_t flags = 3) {
+    test::WriteSortedFile(scratch_.Path() + "sorted", entries, flags);
+    MFile sorted;
+    sorted.OpenFile(scratch_.Path() + "sorted", MFile::kReadOnly);
+    CIndexHeader definition;
+    definition.IndexName = name;
+    definition.GeneralFlags = flags;
+    definition.FindexType = 2;
+    definition.SortMax = 77;
+    CPiFIndex(defs_).BuildFromSorted(definition, sorted, rebuild);
+  }
+  std::set<std::string> Files() const {
+    std::set<std::string> names;
+    for (const auto& f : fs::directory_iterator(Indexes()))
+      names.insert(f.path().filename().string());
+    return names;
+  }
+  std::string Bytes(const std::string& file) const { return test::ReadFile(Indexes() + file); }
+  test::DecodedFindex Decode(const std::string& upper_name) const {
+    return test::DecodeFindex(Indexes() + upper_name + ".sdx", Indexes() + upper_name + ".fst", 2,
+                              3);
+  }
+
+  test::ConfiguredHome home_;
+  test::ScratchDir scratch_{"findex-build"};
+  CGlobalDefs defs_;
+};
+
+TEST_F(FindexBuildTest, BuildsUnderTheUpperCasedNameAndRebuildsInPlace) {
+  const auto first = Words("first", 50);
+  Build("Books", first, true);
+  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKS.fst", "BOOKS.sdx"}));
+  EXPECT_EQ(defs_.GetProgress(), 100);
+  test::DecodedFindex decoded = Decode("BOOKS");
+  EXPECT_EQ(decoded.faults, std::vector<std::string>{});
+  EXPECT_EQ(decoded.words, test::ExpectedWords(first, 3));
+
+  CPiFIndex findex(defs_);
+  findex.Open("books", 3);
+  const CIndexHeader& header = findex.Header();
+  EXPECT_EQ(header.IndexName, "Books");  // as written
+  EXPECT_EQ(header.BlockNum, decoded.block_num);
+  EXPECT_EQ(header.WordCount, 100);
+  EXPECT_EQ(header.DistinctWordCount, 50);
+  EXPECT_EQ(header.BuildState, 1);
+  EXPECT_EQ(header.SortMax, 77);
+  findex.Close();
+
+  // The connection in use is stored when the definition asks for it.
+  defs_.SetConnection("DSN=Library;UID=u;PWD=p", "");
+  const auto second = Words("second", 70);
+  Build("BOOKS", second, true, 3 | 8);
+  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKS.fst", "BOOKS.sdx"}));
+  EXPECT_EQ(Decode("BOOKS").words, test::ExpectedWords(second, 3));
+  findex.Open("Books", 3);
+  EXPECT_EQ(findex.Header().ConnectionString, "DSN=Library;UID=u;PWD=p");
+  EXPECT_EQ(findex.Header().DisplayName, "LIBRARY");
+}
+
+TEST_F(FindexBuildTest, BuildsFromTableRows) {
+  fs::create_directories(home_.Data() + "Groups/PUBLIC/WorkData");
+  defs_.SetConnectionString("Driver=SQLite3;Database=" + scratch_.Path() + "rows.db;StepAPI=1", "");
+  auto run = [&](const std::string& sql) {
+    CShareDatabase db(defs_);
+    db.Connect();
+    int16_t columns = 0;
+    db.ExecuteSql(sql, columns);
+  };
+  run("CREATE TABLE docs (id INTEGER, body TEXT)");
+  run("INSERT INTO docs VALUES (1, 'alpha beta'), (2, 'beta gamma beta'), (3, NULL)");
+  CIndexHeader definition;
+  definition.IndexName = "Docs";
+  definition.TableName = "docs";
+  definition.KeyColumn = "id";
+  definition.Columns["body"] = {};
+  definition.GeneralFlags = 7;  // scores, positions, default separators
+  definition.LanguageFlags = 0;
+  CPiFIndex(defs_).BuildRowFindex(definition, true);
+  const std::vector<test::Word> words = {{std::string("ALPHA"), {{1, 1, 1}}},
+                                         {std::string("BETA"), {{1, 1, 2}, {2, 1, 1}, {2, 1, 3}}},
+                                         {std::string("GAMMA"), {{2, 1, 2}}}};
+  EXPECT_EQ(Decode("DOCS").words, words);
+  EXPECT_EQ(definition.KeyCount, 3);
+  EXPECT_EQ(definition.SortMax, 3);
+  const std::string sdx = Bytes("DOCS.sdx");
+
+  // A sort that fails leaves the findex and no file behind.
+  definition.SortMax = 0;  // rebuilds read every row
+  definition.TableName = "missing";
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+              CPiFIndex(defs_).BuildRowFindex(definition, true);
+            }).text,
+            "");
+  EXPECT_EQ(Files(), (std::set<std::string>{"DOCS.fst", "DOCS.sdx"}));
+  EXPECT_EQ(Bytes("DOCS.sdx"), sdx);
+  EXPECT_TRUE(fs::is_empty(home_.Data() + "Groups/PUBLIC/WorkData"));
+
+  // Rows that give no word rebuild the findex empty.
+  definition.TableName = "docs";
+  run("UPDATE docs SET body = NULL");
+  CPiFIndex(defs_).BuildRowFindex(definition, true);
+  EXPECT_EQ(Decode("DOCS").block_num, 1);
+  EXPECT_TRUE(Decode("DOCS").words.empty());
+}
+
+TEST_F(FindexBuildTest, BuildsWithoutEntries) {
+  Build("Books", Words("w", 5), true);
+  const std::string sdx = Bytes("BOOKS.sdx");
+  // An update that found nothing keeps the findex and makes no add-on.
+  Build("Books", {}, false);
+  Build("Books_ADD_1", {}, false);
+  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKS.fst", "BOOKS.sdx"}));
+  EXPECT_EQ(Bytes("BOOKS.sdx"), sdx);
+  // A rebuild that found nothing replaces the findex with one without words.
+  Build("Books", {}, true);
+  const test::DecodedFindex decoded = Decode("BOOKS");
+  EXPECT_EQ(decoded.faults, std::vector<std::string>{});
+  EXPECT_EQ(decoded.block_num, 1);
+  EXPECT_TRUE(decoded.words.empty());
+  EXPECT_EQ(Bytes("BOOKS.fst"), "");
+}
+
+TEST_F(FindexBuildTest, AnAddOnUpdateReplacesOnlyItsAddOnAndARebuildDropsAddOnsAndDeletedKeys) {
+  Build("Books", Words("main", 20), true);
+  test::WriteFile(Indexes() + "BOOKS.del", std::string("\x01\0\0\0\x05\0\0\0", 8));
+  const std::string main_sdx = Bytes("BOOKS.sdx");
+  const std::string main_fst = Bytes("BOOKS.fst");
+  Build("Books_ADD_1", Words("add", 10), false);
+  const auto update = Words("again", 12);
+  Build("Books_ADD_1", update, false);
+  Build("Books_ADD_2", Words("two", 3), false);
+  EXPECT_EQ(Files(),
+            (std::set<std::string>{"BOOKS.del", "BOOKS.fst", "BOOKS.sdx", "BOOKS_ADD_1.fst",
+                                   "BOOKS_ADD_1.sdx", "BOOKS_ADD_2.fst", "BOOKS_ADD_2.sdx"}));
+  EXPECT_EQ(Decode("BOOKS_ADD_1").words, test::ExpectedWords(update, 3));
+  EXPECT_EQ(Bytes("BOOKS.sdx"), main_sdx);
+  EXPECT_EQ(Bytes("BOOKS.fst"), main_fst);
+
+  Build("books", Words("new", 30), true);
+  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKS.fst", "BOOKS.sdx"}));
+}
+
+TEST_F(FindexBuildTest, FailedBuildsLeaveTheFindexAsItWasAndNoTemporaryFile) {
+  Build("Books", Words("old", 40), true);
+  test::WriteFile(Indexes() + "BOOKS.del", std::string("\x01\0\0\0\x05\0\0\0", 8));
+  const auto files = Files();
+  const std::string sdx = Bytes("BOOKS.sdx");
+  const std::string fst = Bytes("BOOKS.fst");
+
+  struct Case {
+    const char* name;
+    std::function<void()> arrange;
+    std::vector<Entry> entries;
+    const char* raised;  // part of the outermost text
+  };
+  FindexLimits few_blocks;
+  few_blocks.max_block_number = 10;
+  FindexLimits few_bytes;
+  few_bytes.max_fst_bytes = 500;
+  int renames = 0;
+  CLockManager reader("PUBLIC", "Books", kLockFindex);
+  const std::vector<Case> cases = {
+      {"block numbers", [&] { SetFindexLimitsForTesting(few_blocks); }, Words("x", 300, 400),
+       "16-bit block numbers"},
+      {"positions", [&] { SetFindexLimitsForTesting(few_bytes); }, Words("x", 300),
+       "32-bit positions"},
+      {"full root", [] { SetFindexLimitsForTesting({}); }, Words("x", 40, 2000),
+       "too large for its word tree"},
+      {"unsorted",
+       [] {},
+       {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}},
+       "out of order"},
+      {"rename",
+       [&] {
+         findex::SetRenameHookForTesting([&](const std::string& target) {
+           return target.ends_with("/BOOKS.fst") && ++renames == 1;
+         });
+       },
+       Words("x", 30), "Error renaming index file"},
+      {"readers",
+       [&] {
+         findex::SetRenameHookForTesting({});
+         reader.LockReader();
+         CLockManager::ScaleTimeoutsForTesting(0.001);
+       },
+       Words("x", 30), "Could not get exclusive access to findex BOOKS"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    c.arrange();
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                Build("Books", c.entries, true);
+              }).text.find(c.raised),
+              std::string::npos);
+    EXPECT_EQ(Files(), files);
+    EXPECT_EQ(Bytes("BOOKS.sdx"), sdx);
+    EXPECT_EQ(Bytes("BOOKS.fst"), fst);
+  }
+  EXPECT_EQ(renames, 2);  // the failed move, then the old file's way back
+}
+
+TEST_F(FindexBuildTest, DropRemovesTheFindexWithItsAddOnsAndDeletedKeysButNotAnAddOnAlone) {
+  Build("Books", Words("main", 20), true);
+  Build("Books_ADD_1", Words("one", 5), false);
+  Build("Books_ADD_2", Words("two", 5), false);
+  Build("Bookshelf", Words("other", 5), true);
+  test::WriteFile(Indexes() + "BOOKS.del", std::string("\x01\0\0\0\x05\0\0\0", 8));
+  const auto files = Files();
+  CPiFIndex findex(defs_);
+  findex.Open("Books_add_1", 3);
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { findex.DropFindex(); }).number, 44);
+  EXPECT_EQ(Files(), files);
+
+  CLockManager files_lock("PUBLIC", "Books", kLockFindex);
+  CLockManager deleted_keys_lock("PUBLIC", "Books", kLockDeletedKeys);
+  files_lock.LockExclusive();
+  deleted_keys_lock.LockExclusive();
+  findex.Open("books", 3);
+  findex.DropFindex();
+  EXPECT_FALSE(findex.IsOpen());
+  EXPECT_EQ(Files(), (std::set<std::string>{"BOOKSHELF.fst", "BOOKSHELF.sdx"}));
+}
+
+TEST_F(FindexBuildTest, OpenReadsOnlyExistingFindexesUnderPlainNames) {
+  Build("Books", Words("w", 5), true);
+  const auto files = Files();
+  const std::string sdx = Bytes("BOOKS.sdx");
+  CPiFIndex findex(defs_);
+  EXPECT_NE(test::Raised<CPiFIndexException>([&] { findex.Open("Missing", 3); }).text, "");
+  // Modes that create or truncate never touch an existing findex.
+  for (int32_t mode : {1, 2, 5}) {
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                findex.Open("Books", mode);
+              }).text.find("Unknown index mode"),
+              std::string::npos);
+  }
+  for (const std::string& name :
+       {std::string(), std::string(".."), std::string("../Books"), std::string("a\\b"),
+        std::string("a\"b"), std::string("a\nb"), std::string(200, 'n')}) {
+    EXPECT_NE(test::Raised<CPiFIndexException>([&] {
+                findex.Open(name, 4);
+              }).text.find("Invalid findex name"),
+              std::string::npos)
+        << name;
+  }
+  EXPECT_FALSE(findex.IsOpen());
+  EXPECT_EQ(Files(), files);
+  EXPECT_EQ(Bytes("BOOKS.sdx"), sdx);
+  findex.Open(std::string(199, 'n'), 4);
+  EXPECT_THROW(findex.Header(), CPiFIndexException);
+}
+
+TEST_F(FindexBuildTest, ReadersUnderTheFindexLockSeeTheWholeOldOrNewFindex) {
+  const auto small = Words("small", 300);
+  const auto large = Words("large", 3000);
+  const auto small_words = test::ExpectedWords(small, 3);
+  const auto large_words = test::ExpectedWords(large, 3);
+  Build("Books", small, true);
+  // Slow renames give a reader that ignored the lock every chance to meet a
+  // findex half moved.
+  findex::SetRenameHookForTesting([](const std::string&) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    return false;
+  });
+
+  std::atomic<bool> building{true};
+  std::atomic<int> reads{0};
+  std::vector<std::string> seen_faults;
+  std::thread reader([&] {
+    while (building.load()) {
+      CLockManager lock("PUBLIC", "Books", kLockFindex);
+      lock.LockReader();
+      const test::DecodedFindex decoded = Decode("BOOKS");
+      lock.UnlockReaders();
+      if (!decoded.faults.empty()) seen_faults.push_back(decoded.faults.front());
+      if (decoded.words != small_words && decoded.words != large_words)
+        seen_faults.push_back("mixed");
+      ++reads;
+      // Pacing, so the builder's wait for every reader unit is not starved.
+      std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+  });
+  for (int i = 0; i < 12; ++i) Build("Books", i % 2 == 0 ? large : small, true);
+  // The reader gets at least one look at the last findex.
+  const int before = reads.load();
+  while (reads.load() < before + 2) std::this_thread::yield();
+  building = false;
+  reader.join();
+  EXPECT_EQ(seen_faults, std::vector<std::string>{});
+  EXPECT_EQ(Decode("BOOKS").words, small_words);
+}
+
+}  // namespace
+}  // namespace qm

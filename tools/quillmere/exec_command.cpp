@@ -1,0 +1,105 @@
+// quillmere exec: runs one command statement through the command object,
+// blocking, or as a background job whose progress the host shows.
+#include <chrono>
+#include <cstdio>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "command_registry.h"
+#include "host_session.h"
+#include "platform/terminal.h"
+#include "platform/text_encoding.h"
+
+namespace qm::cli {
+namespace {
+
+constexpr const char* kUsage = "exec [--background] STATEMENT";
+constexpr int kBarWidth = 40;
+
+void PrintHelp() {
+  std::printf(
+      "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
+      "Runs a command statement (CREATE FINDEX, UPDATE FINDEX, DROP FINDEX, CONNECT,\n"
+      "SET GROUP, SET CONNECTIONSTRING, CREATE INDEX ...) and waits for it. Several\n"
+      "arguments are joined with blanks into one statement.\n\n"
+      "With --background the statement runs as a background job; the host polls its\n"
+      "progress, drawing a bar on a terminal and printing a line per percentage\n"
+      "otherwise, then reports the job's error, if any.\n\n"
+      "Exit status: 0 done, 1 the statement failed (message on standard error),\n"
+      "2 usage error.\n",
+      kUsage);
+}
+
+void DrawProgress(int32_t percent, bool terminal) {
+  if (terminal) {
+    const int filled = percent * kBarWidth / 100;
+    std::printf("\r[%s%s] %3d%%", std::string(static_cast<std::size_t>(filled), '#').c_str(),
+                std::string(static_cast<std::size_t>(kBarWidth - filled), ' ').c_str(), percent);
+    if (percent == 100) std::printf("\n");
+  } else {
+    std::printf("%d%%\n", percent);
+  }
+  std::fflush(stdout);
+}
+
+int RunBackground(HostSession& session, const BSTR* statement) {
+  APICommand& command = session.Command();
+  if (command.ExecuteEx(statement, VARIANT_FALSE) != S_OK) return session.Fail();
+  const bool terminal = platform::IsTerminal(stdout);
+  int32_t shown = -1;
+  for (;;) {
+    int32_t progress = 0;
+    if (command.GetProgress(&progress) != S_OK) return session.Fail();
+    if (progress != shown) {
+      DrawProgress(progress, terminal);
+      shown = progress;
+    }
+    if (progress >= 100) break;
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  }
+  int32_t failed = 0;
+  BSTR message;
+  if (command.GetErrorNumber(&failed) != S_OK || command.GetErrorMsg(&message) != S_OK) {
+    return session.Fail();
+  }
+  if (failed == 0) return kExitOk;
+  std::string text = Utf16ToUtf8(message);
+  for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
+    text.erase(at, 1);
+  }
+  if (text.empty() || text.back() != '\n') text += '\n';
+  std::fprintf(stderr, "quillmere exec: %s", text.c_str());
+  return kExitError;
+}
+
+int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
+  HostSession session("exec");
+  bool background = false;
+  std::string statement;
+  for (const std::string& a : args) {
+    if (statement.empty() && (a == "--help" || a == "-h")) {
+      PrintHelp();
+      return kExitOk;
+    }
+    if (statement.empty() && a == "--background") {
+      background = true;
+    } else if (statement.empty() && a.rfind("--", 0) == 0) {
+      return session.Usage("unknown option: " + a, kUsage);
+    } else {
+      if (!statement.empty()) statement += ' ';
+      statement += a;
+    }
+  }
+  if (statement.empty()) return session.Usage("no statement given", kUsage);
+  if (!session.Open(global)) return kExitError;
+  const BSTR* text = session.Text(statement);
+  if (background) return RunBackground(session, text);
+  if (session.Command().ExecuteEx(text, VARIANT_TRUE) != S_OK) return session.Fail();
+  return kExitOk;
+}
+
+const CommandRegistration kExec{{"exec", kUsage, "run a command statement", RunExec}};
+
+}  // namespace
+}  // namespace qm::cli

@@ -1,0 +1,82 @@
+#include "host_session.h"
+
+#include <cstdio>
+
+#include "platform/text_encoding.h"
+
+namespace qm::cli {
+
+namespace {
+
+// A connection-string value: braced when it holds a character that would end
+// or open one, with "}" doubled inside.
+std::string ConnectionValue(std::string_view value) {
+  const bool blank_at_end = !value.empty() && (value.front() == ' ' || value.back() == ' ');
+  if (value.find_first_of(";{}") == std::string_view::npos && !blank_at_end) {
+    return std::string(value);
+  }
+  std::string out = "{";
+  for (char c : value) {
+    out += c;
+    if (c == '}') out += '}';
+  }
+  return out + "}";
+}
+
+}  // namespace
+
+std::string DsnConnectionString(std::string_view dsn, std::string_view user,
+                                std::string_view password) {
+  return "DSN=" + ConnectionValue(dsn) + ";UID=" + ConnectionValue(user) +
+         ";PWD=" + ConnectionValue(password) + ";";
+}
+
+const BSTR* HostSession::Text(std::string_view utf8) {
+  texts_.push_back(Utf8ToUtf16(utf8));
+  return &texts_.back();
+}
+
+bool HostSession::Open(const GlobalOptions& options) {
+  command_ = std::make_unique<APICommand>();
+  if (!options.data_dir.empty() && command_->SetDataPath(Text(options.data_dir)) != S_OK) {
+    return Fail(), false;
+  }
+  if (!options.group.empty() && command_->SetGroup(Text(options.group)) != S_OK) {
+    return Fail(), false;
+  }
+  if (!options.connect.empty()) {
+    if (command_->SetDBConnectionString(Text(options.connect)) != S_OK) return Fail(), false;
+  } else if (!options.dsn.empty()) {
+    // Stored without a test, as a connection string: commands that need no
+    // data source still run when it is away.
+    const std::string text = DsnConnectionString(options.dsn, options.user, options.password);
+    if (command_->SetDBConnectionStringEx(Text(text), Text(options.dsn)) != S_OK) {
+      return Fail(), false;
+    }
+  }
+  if (command_->LoadDefaultIndexOptions() != S_OK || command_->LoadDefaultOrderOptions() != S_OK) {
+    return Fail(), false;
+  }
+  return true;
+}
+
+int HostSession::Fail() {
+  ErrorInfo info;
+  std::string text = GetErrorInfo(info) ? Utf16ToUtf8(info.Description) : "unknown failure";
+  // The message chain's lines end in "\r\n"; a terminal wants "\n".
+  for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
+    text.erase(at, 1);
+  }
+  if (text.empty() || text.back() != '\n') text += '\n';
+  std::fprintf(stderr, "quillmere %s: %s", name_.c_str(), text.c_str());
+  return kExitError;
+}
+
+int HostSession::Usage(std::string_view message, std::string_view usage) {
+  std::fprintf(stderr, "quillmere %s: %.*s\nusage: quillmere %.*s\n", name_.c_str(),
+               static_cast<int>(message.size()), message.data(), static_cast<int>(usage.size()),
+               usage.data());
+  return kExitUsage;
+}
+
+}  // namespace qm::cli

@@ -1,0 +1,45 @@
+// The command object of one host invocation, set up from the global options:
+// data path, group, data-source connection, and the group's saved default
+// options.
+#pragma once
+
+#include <deque>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "command_registry.h"
+#include "quillmere/api_command.h"
+
+namespace qm::cli {
+
+class HostSession {
+ public:
+  // name: the subcommand, for messages ("quillmere NAME: ...").
+  explicit HostSession(std::string name) : name_(std::move(name)) {}
+
+  // Creates the object and applies the options; false after printing the
+  // error.
+  bool Open(const GlobalOptions& options);
+  APICommand& Command() { return *command_; }
+
+  // A text argument that stays valid for the session.
+  const BSTR* Text(std::string_view utf8);
+
+  // Prints the calling thread's error information to standard error and
+  // returns kExitError.
+  int Fail();
+  // Prints "quillmere NAME: message" to standard error and returns kExitUsage.
+  int Usage(std::string_view message, std::string_view usage);
+
+ private:
+  std::string name_;
+  std::unique_ptr<APICommand> command_;
+  std::deque<BSTR> texts_;
+};
+
+// A connection string naming a DSN triple, values braced where they need it.
+std::string DsnConnectionString(std::string_view dsn, std::string_view user,
+                                std::string_view password);
+
+}  // namespace qm::cli

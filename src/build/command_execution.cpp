@@ -7,6 +7,9 @@
 #include "build/findex_file_set.h"
 #include "build/findex_files.h"
 #include "build/findex_writer.h"
+#include "build/order_file_set.h"
+#include "build/order_layout.h"
+#include "build/pi_order.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -34,12 +37,6 @@ constexpr int64_t kHeaderBlockLimit = 4095;
 
 // The general option bits an update cannot add to a findex built without them.
 constexpr int32_t kPostingLayoutBits = kIgoSupportScore | kIgoSupportPhrases;
-
-// The order builder comes with its own part of the engine; until then the
-// order commands are refused with this text.
-constexpr std::string_view kOrdersNotAvailable =
-    "Orders are not available in this build of Quillmere Search: CREATE ORDER, UPDATE ORDER, "
-    "DROP ORDER and CreateOrder need the order builder, which is not part of it";
 
 // Holds one per-command writer lock for a scope.
 class CommandLock {
@@ -258,14 +255,33 @@ void CommandExecution::BuildFindex(Command& command) {
 }
 
 void CommandExecution::BuildOrder(Command& command) {
-  RequireBuildableOrder(command.order, defs_, kExecuteW);
+  COrderInfo& definition = command.order;
+  RequireBuildableOrder(definition, defs_, kExecuteW);
   RequireDataPathValid();
-  const CommandLock lock(command.type, command.order.OrderName);
-  // The order builder is called here once it is part of the engine: the
-  // order type starts at 0, a stored definition or the existing order's
-  // highest keys are taken over as for a findex, then BuildOrderAll (type 2)
-  // or BuildOrderInt runs.
-  throw CPiStartPointException::Text(kOrdersNotAvailable, kExecuteW, nullptr);
+  const std::string name = definition.OrderName;
+  const CommandLock lock(command.type, name);
+  const bool rebuild = command.rebuild != 0;
+  if (command.type == kCmdOrderStored) {
+    // CREATE ORDER name and UPDATE ORDER name work from the stored definition,
+    // its options and its type included.
+    definition = order_files::ReadInfoShared(defs_, name);
+  } else {
+    definition.OrderType = 0;
+  }
+  // An update starts past the stored order's highest keys (the builder takes
+  // them over from the order it merges with); a rebuild reads every row.
+  if (rebuild) {
+    definition.SortMax = 0;
+    definition.MaxDateTimeKey = DateTimeValue{};
+  }
+  Trace(defs_.TraceLevel1(), kTraceTag, "Order: %s, Rebuild: %i, Order Type: %i", name,
+        rebuild ? 1 : 0, definition.OrderType);
+  CPiOrder builder(defs_);
+  if (definition.OrderType == kOrderTypeRanks) {
+    builder.BuildOrderAll(definition, rebuild);
+  } else {
+    builder.BuildOrderInt(definition, rebuild);
+  }
 }
 
 void CommandExecution::DropFindex(const std::string& name) {
@@ -285,9 +301,13 @@ void CommandExecution::DropFindex(const std::string& name) {
 
 void CommandExecution::DropOrder(const std::string& name) {
   RequirePlainName<CPiStartPointException>("order", name, kExecuteW);
-  const CommandLock lock(kCmdDropOrder, name);
-  // The order builder's DropOrder is called here once it is part of the engine.
-  throw CPiStartPointException::Text(kOrdersNotAvailable, kExecuteW, nullptr);
+  const CommandLock drop_lock(kCmdDropOrder, name);
+  // A drop never races a build of the same order; searches are waited for
+  // under the order's kind 3 lock, which DropOrder takes.
+  const CommandLock order_lock(kCmdOrderDefined, name);
+  CPiOrder order(defs_);
+  order.OpenOrder(name, CPiOrder::kModeRead);
+  order.DropOrder();
 }
 
 void CommandExecution::DeleteKey(const Command& command) {

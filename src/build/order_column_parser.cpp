@@ -11,7 +11,9 @@ constexpr int32_t kColumnListRejected = 17;
 }  // namespace
 
 void ParseOrderColumns(std::u16string_view list, OrderColumnList& columns, const char* method) {
-  auto reject = [method] { return CPiCmdException::Numbered(kColumnListRejected, method, nullptr); };
+  auto reject = [method] {
+    return CPiCmdException::Numbered(kColumnListRejected, method, nullptr);
+  };
   OrderColumnList parsed = Guard<CPiCmdException, CPiCmdUnknownException>("InsertIndexTags", [&] {
     OrderColumnList result;
     bool unterminated = false;

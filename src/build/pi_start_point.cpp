@@ -11,7 +11,7 @@
 #include "build/option_files.h"
 #include "build/option_text.h"
 #include "build/order_column_parser.h"
-#include "build/order_files.h"
+#include "build/order_file_set.h"
 #include "build/statement_mask.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -396,7 +396,7 @@ std::string CPiStartPoint::GetOrderInfo(int32_t info) {
   constexpr const char* kMethod = "GetOrderInfo";
   return Public(kMethod, [&] {
     const std::string name = CurrentObjectName(kMethod);
-    return OrderInformation(ReadOrderInfoShared(defs_, name), info);
+    return OrderInformation(order_files::ReadInfoShared(defs_, name), info);
   });
 }
 
@@ -468,7 +468,7 @@ IndexOptions CPiStartPoint::StoredIndexOptions(const char* method) {
 }
 
 OrderOptions CPiStartPoint::StoredOrderOptions(const char* method) {
-  return OrderOptionsOf(ReadOrderInfoShared(defs_, CurrentObjectName(method)));
+  return OrderOptionsOf(order_files::ReadInfoShared(defs_, CurrentObjectName(method)));
 }
 
 std::string CPiStartPoint::GetIndexLanguageOption(int32_t option, bool get_default_value) {

@@ -237,16 +237,6 @@ TEST_F(CommandEngineTest, FindexExistSetsTheGroup) {
   EXPECT_FALSE(fs::exists(ConfigFolder() + "ogo.dat"));
 }
 
-TEST_F(CommandEngineTest, OrdersSayTheyAreNotAvailable) {
-  for (const char* statement : {"CREATE ORDER Titles ON TABLE t COLUMNS a KEY id",
-                                "UPDATE ORDER Titles", "DROP ORDER Titles"}) {
-    EXPECT_TRUE(Contains(Run(statement), "Orders are not available in this build")) << statement;
-  }
-  EXPECT_EQ(command_->CreateOrder(T("Titles"), T("select id, a from t"), T("a"), T("id")),
-            DISP_E_EXCEPTION);
-  EXPECT_TRUE(Contains(LastError(), "Orders are not available"));
-}
-
 TEST_F(CommandEngineTest, TraceSessionBannerAndStatements) {
   command_.reset();
   const std::string trace = TraceText();

@@ -85,7 +85,8 @@ TEST_F(EngineCommandsTest, UsageErrorsExitTwo) {
         {"options", "get"},
         {"exec"},
         {"exec", "--fast", "DROP FINDEX x"},
-        {"info", "order", "x"},
+        {"info", "index", "x"},
+        {"drop", "table", "x"},
         {"drop", "findex"},
         {"exists"}}) {
     const Result r = Host(args);
@@ -169,6 +170,55 @@ TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {
   r = Host({"exec", "--background", "SET", "GROUP", "PUBLIC"});
   EXPECT_EQ(r.status, 0) << r.err;
   EXPECT_EQ(r.err, "");
+}
+
+TEST_F(EngineCommandsTest, ExecBuildsUpdatesAndDropsAnOrderThatInfoShows) {
+  fs::create_directories(dir_.Path() + "data/Groups/PUBLIC/Orders");
+  const std::string database = dir_.Path() + "books.db";
+  const std::string connect = "Driver=SQLite3;Database=" + database + ";StepAPI=1;";
+  auto sql = [&](const std::string& statement) {
+    CGlobalDefs defs;
+    defs.SetConnectionString(connect, "books");
+    CShareDatabase db(defs);
+    db.Connect();
+    int16_t columns = 0;
+    db.ExecuteSql(statement, columns);
+    db.Disconnect();
+  };
+  sql("create table books (id integer, title varchar(50), year integer)");
+  sql("insert into books values (1, 'River', 1999), (2, 'lake', 2004)");
+  ASSERT_EQ(Host({"options", "set", "order-general", "ogoIgnorreCase=1"}).status, 0);
+  Result r = Host({"--connect", connect, "exec", "CREATE", "ORDER", "Titles", "ON", "TABLE",
+                   "books", "COLUMNS", "title,year", "KEY", "id"});
+  ASSERT_EQ(r.status, 0) << r.err;
+
+  r = Host({"info", "order", "Titles"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  for (const char* line : {"odrTableName\tbooks\n", "odrColumnNames\ttitle,year\n",
+                           "odrKeyName\tid\n", "odrTypeName\ttext\n", "odrType\t2\n",
+                           "odrVersion\t6.14\n", "odrSQLUsedAsTable\tno\n"}) {
+    EXPECT_NE(r.out.find(line), std::string::npos) << line << r.out;
+  }
+  EXPECT_EQ(std::count(r.out.begin(), r.out.end(), '\n'), 12);
+
+  sql("insert into books values (3, 'RIVER', 2010)");
+  r = Host({"--connect", connect, "exec", "--background", "UPDATE ORDER Titles"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_EQ(r.out.substr(r.out.size() - 5), "100%\n") << r.out;
+  const std::string orders = dir_.Path() + "data/Groups/PUBLIC/Orders/";
+  const std::string column = test::ReadFile(orders + "TITLES_TITLE.col");
+  // LAKE {2}, RIVER {1, 3}: the update's key joined the upper-cased value.
+  EXPECT_EQ(column, std::string("\x04\0LAKE\x01\0\0\0\x02\0\0\0\x05\0RIVER\x02\0\0\0"
+                                "\x01\0\0\0\x03\0\0\0", 33));
+
+  r = Host({"--connect", connect, "exec", "UPDATE ORDER Titles ON TABLE books COLUMNS year KEY id"});
+  EXPECT_EQ(r.status, 1);
+  EXPECT_NE(r.err.find("Order definition changed, rebuild required"), std::string::npos) << r.err;
+  EXPECT_EQ(Host({"exec", "DROP ORDER Titles"}).status, 0);
+  EXPECT_TRUE(fs::is_empty(orders));
+  r = Host({"drop", "order", "Titles"});
+  EXPECT_EQ(r.status, 1);
+  EXPECT_EQ(r.err.rfind("quillmere drop: ", 0), 0u) << r.err;
 }
 
 }  // namespace

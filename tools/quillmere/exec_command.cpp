@@ -20,9 +20,10 @@ constexpr int kBarWidth = 40;
 void PrintHelp() {
   std::printf(
       "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
-      "Runs a command statement (CREATE FINDEX, UPDATE FINDEX, DROP FINDEX, CONNECT,\n"
-      "SET GROUP, SET CONNECTIONSTRING, CREATE INDEX ...) and waits for it. Several\n"
-      "arguments are joined with blanks into one statement.\n\n"
+      "Runs a command statement (CREATE FINDEX, UPDATE FINDEX, DROP FINDEX, CREATE ORDER,\n"
+      "UPDATE ORDER, DROP ORDER, CONNECT, SET GROUP, SET CONNECTIONSTRING, CREATE INDEX\n"
+      "...) and waits for it. Several arguments are joined with blanks into one\n"
+      "statement.\n\n"
       "With --background the statement runs as a background job; the host polls its\n"
       "progress, drawing a bar on a terminal and printing a line per percentage\n"
       "otherwise, then reports the job's error, if any.\n\n"

@@ -1,6 +1,7 @@
-// quillmere info findex NAME: every information value of a findex, one line
-// each, enum-name<TAB>text.
+// quillmere info findex NAME | info order NAME: every information value of a
+// findex or an order, one line each, enum-name<TAB>text.
 #include <cstdio>
+#include <span>
 #include <string>
 #include <utility>
 #include <vector>
@@ -12,9 +13,9 @@
 namespace qm::cli {
 namespace {
 
-constexpr const char* kUsage = "info findex NAME";
+constexpr const char* kUsage = "info findex NAME | info order NAME";
 
-constexpr std::pair<const char*, idxInfoEnum> kFindexValues[] = {
+constexpr std::pair<const char*, int32_t> kFindexValues[] = {
     {"idxTableName", idxTableName},
     {"idxColumnNames", idxColumnNames},
     {"idxKeyName", idxKeyName},
@@ -35,12 +36,28 @@ constexpr std::pair<const char*, idxInfoEnum> kFindexValues[] = {
     {"idxIndexStartValue", idxIndexStartValue},
 };
 
+constexpr std::pair<const char*, int32_t> kOrderValues[] = {
+    {"odrTableName", odrTableName},
+    {"odrColumnNames", odrColumnNames},
+    {"odrKeyName", odrKeyName},
+    {"odrTypeName", odrTypeName},
+    {"odrType", odrType},
+    {"odrVersion", odrVersion},
+    {"odrSQLUsedAsTable", odrSQLUsedAsTable},
+    {"odrSQLSelect", odrSQLSelect},
+    {"odrDBConnectionString", odrDBConnectionString},
+    {"odrDBDisplayName", odrDBDisplayName},
+    {"odrBuildTime", odrBuildTime},
+    {"odrLastUpdateTime", odrLastUpdateTime},
+};
+
 void PrintHelp() {
   std::printf(
       "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
-      "Prints every information value of the findex NAME in the group, one line each:\n"
-      "enum-name<TAB>text (idxKeyName<TAB>id). Counts include the add-on findexes.\n"
-      "The stored connection string is printed as stored, password included.\n",
+      "Prints every information value of the findex or order NAME in the group, one\n"
+      "line each: enum-name<TAB>text (idxKeyName<TAB>id). Findex counts include the\n"
+      "add-on findexes. The texts of an order come lower-cased, as GetOrderInfo gives\n"
+      "them. The stored connection string is printed as stored, password included.\n",
       kUsage);
 }
 
@@ -50,16 +67,21 @@ int RunInfo(const GlobalOptions& global, const std::vector<std::string>& args) {
     PrintHelp();
     return kExitOk;
   }
-  if (args.size() != 2 || args[0] != "findex") {
-    return session.Usage("expected: findex NAME", kUsage);
+  if (args.size() != 2 || (args[0] != "findex" && args[0] != "order")) {
+    return session.Usage("expected: findex NAME or order NAME", kUsage);
   }
+  const bool order = args[0] == "order";
   if (!session.Open(global)) return kExitError;
   APICommand& command = session.Command();
   if (command.SetCurrentObjectName(session.Text(args[1])) != S_OK) return session.Fail();
+  using Values = std::span<const std::pair<const char*, int32_t>>;
+  const Values values = order ? Values(kOrderValues) : Values(kFindexValues);
   std::string out;
-  for (const auto& [name, value] : kFindexValues) {
+  for (const auto& [name, value] : values) {
     BSTR text;
-    if (command.GetFindexInfo(value, &text) != S_OK) return session.Fail();
+    const HRESULT hr =
+        order ? command.GetOrderInfo(value, &text) : command.GetFindexInfo(value, &text);
+    if (hr != S_OK) return session.Fail();
     out += std::string(name) + "\t" + Utf16ToUtf8(text) + "\n";
   }
   std::fputs(out.c_str(), stdout);
@@ -67,7 +89,7 @@ int RunInfo(const GlobalOptions& global, const std::vector<std::string>& args) {
 }
 
 const CommandRegistration kInfo{
-    {"info", kUsage, "print every information value of a findex", RunInfo}};
+    {"info", kUsage, "print every information value of a findex or an order", RunInfo}};
 
 }  // namespace
 }  // namespace qm::cli

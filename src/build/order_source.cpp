@@ -1,0 +1,210 @@
+#include "build/order_source.h"
+
+#include <sqlext.h>
+
+#include <algorithm>
+#include <cmath>
+
+#include "build/row_selection.h"
+#include "platform/local_time.h"
+#include "shared/exception_family.h"
+#include "shared/sql_time.h"
+#include "shared/trace.h"
+#include "sources/column_conversion.h"
+#include "sources/share_database.h"
+
+namespace qm {
+
+namespace {
+
+constexpr int64_t kRowTraceStep = 100000;
+
+bool IsBinary(int16_t sql_type) {
+  return sql_type == SQL_BINARY || sql_type == SQL_VARBINARY || sql_type == SQL_LONGVARBINARY;
+}
+
+RowSelection SelectionOf(const COrderInfo& definition) {
+  RowSelection s;
+  s.Table = definition.TableName;
+  s.SqlUsedAsTable = definition.SqlUsedAsTable;
+  s.SqlSelect = definition.SqlSelect;
+  s.KeyColumn = definition.KeyColumn;
+  for (const OrderColumn& column : definition.Columns) s.Columns.push_back(column.Name);
+  s.SortMax = definition.SortMax;
+  s.UpdateFlags = definition.UpdateFlags;
+  s.DateTimeKeyColumn = definition.DateTimeKeyColumn;
+  s.MaxDateTimeKey = definition.MaxDateTimeKey;
+  return s;
+}
+
+}  // namespace
+
+struct OrderSource::Plan {
+  struct Column {
+    int index = 0;  // 1-based, in the result set
+    VALUE_TYPE type = VALUE_TYPE::Integer;
+  };
+  int key_index = 0;
+  VALUE_TYPE key_type = VALUE_TYPE::Integer;
+  int date_key_index = 0;  // 0: the date/time update key is not in use
+  std::vector<Column> columns;
+};
+
+OrderSource::OrderSource(CGlobalDefs& defs, const COrderInfo& definition, const char* method)
+    : defs_(defs),
+      source_(defs),
+      sort_max_(definition.SortMax),
+      max_date_key_(definition.MaxDateTimeKey) {
+  // The connection stored with the order serves when the caller set none;
+  // the caller's settings stay as they are.
+  if (!source_.IsConnectionSet() && !definition.ConnectionString.empty()) {
+    source_.SetConnection(definition.ConnectionString, definition.DisplayName);
+  }
+  database_ = std::make_unique<CShareDatabase>(source_);
+  database_->Connect();
+
+  const RowSelection selection = SelectionOf(definition);
+  const std::vector<std::string> statements = selection.Statements();
+  start_time_ = SystemTimeToSQLTime(platform::CurrentLocalTime());
+  for (std::size_t i = 0; i < statements.size(); ++i) {
+    Trace(defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData", "Executing SQL. SQL: %s",
+          statements[i]);
+    try {
+      int16_t columns = 0;
+      database_->ExecuteSql(statements[i], columns);
+      break;
+    } catch (const CShareDatabaseException&) {
+      // The date literal forms differ between data sources: try the next one.
+      if (i + 1 == statements.size()) throw;
+    }
+  }
+
+  CShareDatabase& db = *database_;
+  auto require = [&](const std::string& name) {
+    const int index = db.GetColumnIndex(name);
+    if (index == 0) {
+      throw CPiOrderSortException::Text("Column name %S does not exist", method, nullptr, name);
+    }
+    return index;
+  };
+  plan_ = std::make_unique<Plan>();
+  const bool by_name = definition.SqlUsedAsTable != 0;
+  plan_->key_index = by_name ? require(definition.KeyColumn) : 1;
+  plan_->key_type = db.MapColumnType(plan_->key_index);
+  if (selection.UsesDateTimeKey()) plan_->date_key_index = require(definition.DateTimeKeyColumn);
+  int next = 2;
+  for (const OrderColumn& column : definition.Columns) {
+    Plan::Column c;
+    c.index = by_name ? require(column.Name) : next++;
+    // A binary value reaches the row loop as the path of a temporary copy:
+    // nothing an order could sort by.
+    if (IsBinary(db.GetColumnDescription(c.index).sql_type)) {
+      throw CPiOrderSortException::Text("Column %S holds binary data, which cannot be ordered",
+                                        method, nullptr, column.Name);
+    }
+    c.type = db.GetFieldType(c.index);
+    plan_->columns.push_back(c);
+  }
+}
+
+OrderSource::~OrderSource() = default;
+
+bool OrderSource::HasTextColumn() const {
+  return std::any_of(plan_->columns.begin(), plan_->columns.end(),
+                     [](const Plan::Column& c) { return IsTextType(c.type); });
+}
+
+std::vector<OrderColumnLayout> OrderSource::Layouts(bool ranks) const {
+  std::vector<OrderColumnLayout> layouts;
+  int32_t first = 1;
+  for (const Plan::Column& c : plan_->columns) {
+    OrderColumnLayout layout{c.type, first, ranks ? 1 : ValueSlots(c.type)};
+    first += layout.slots;
+    layouts.push_back(layout);
+  }
+  return layouts;
+}
+
+int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, const char* method) {
+  CShareDatabase& db = *database_;
+  const Plan& plan = *plan_;
+  auto row_error = [&](const char* text) {
+    return CPiOrderSortException::Text(text, method, nullptr);
+  };
+  db.AllocateCache();
+  std::vector<CValue> values(plan.columns.size());
+  std::vector<const CValue*> present(plan.columns.size());
+  CValue key_value;
+  CValue date_value;
+  CValue max_date(VALUE_TYPE::DateTime);
+  max_date.SetDateTime(max_date_key_);
+  int64_t rows = 0;
+
+  defs_.SetProgress(5);
+  while (db.IsRowAvailable()) {
+    try {
+      db.CacheColumns();
+    } catch (const CShareDatabaseWarning& warning) {
+      Trace(true, trace_tag,
+            "Fetching database rows interupted because of database warning (probably a harmless "
+            "no rows available): %S",
+            warning.GetCurrentEntry().text);
+      break;
+    }
+    // The key: an integer, or a double that holds a whole number.
+    int32_t key = 0;
+    int result = CShareDatabase::kValueRead;
+    try {
+      result = db.GetColumnValueFromCache(
+          plan.key_index,
+          plan.key_type == VALUE_TYPE::Double ? VALUE_TYPE::Double : VALUE_TYPE::Integer,
+          key_value);
+    } catch (const CShareDatabaseException&) {
+      throw row_error("Unique key is not numeric");
+    }
+    if (result == CShareDatabase::kValueNull)
+      throw row_error("Unique key column contains NULL values");
+    if (plan.key_type == VALUE_TYPE::Double) {
+      const double d = key_value.GetDouble();
+      if (!std::isfinite(d) || d != std::trunc(d) || !DoubleToInteger32(d, key)) {
+        throw row_error("Unique key is not numeric");
+      }
+    } else {
+      key = key_value.GetInteger();
+    }
+    sort_max_ = std::max(sort_max_, key);
+
+    if (plan.date_key_index != 0) {
+      if (db.MapColumnType(plan.date_key_index) != VALUE_TYPE::DateTime) {
+        throw row_error("DateTime key is not a datetime column");
+      }
+      // A row without a date/time key value leaves the highest one as it is.
+      if (db.GetColumnValueFromCache(plan.date_key_index, VALUE_TYPE::DateTime, date_value) ==
+              CShareDatabase::kValueRead &&
+          date_value.Compare(max_date) > 0) {
+        max_date.SetDateTime(date_value.GetDateTime());
+      }
+    }
+
+    for (std::size_t i = 0; i < plan.columns.size(); ++i) {
+      const Plan::Column& c = plan.columns[i];
+      if (db.GetColumnValueFromCache(c.index, c.type, values[i]) == CShareDatabase::kValueNull) {
+        present[i] = nullptr;
+        ++nulls_;
+      } else {
+        present[i] = &values[i];
+      }
+    }
+    visit(key, present);
+    db.CleanCacheColumns();
+    ++rows;
+    if (rows % kRowTraceStep == 0)
+      Trace(defs_.TraceLevel1(), trace_tag, "------ Reading row %i\n", rows);
+    if (db.MoveNext() != CShareDatabase::kRowFetched) break;
+  }
+  max_date_key_ = max_date.GetDateTime();
+  Trace(defs_.TraceLevel1(), trace_tag, "------ %i nulls\n", nulls_);
+  return rows;
+}
+
+}  // namespace qm

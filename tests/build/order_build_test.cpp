@@ -1,0 +1,498 @@
+// The order builder against real data sources (SQLite through its ODBC
+// driver, and the PostgreSQL server of scripts/test through both of its
+// drivers): the files of type 1 and type 2 orders read back with the
+// decoder of order_file_decoder.h, updates, refusals, drops, and what
+// failures leave behind.
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <bit>
+#include <cstdlib>
+#include <filesystem>
+#include <functional>
+#include <map>
+
+#include "build/order_file_set.h"
+#include "build/pi_order.h"
+#include "locks/lock_manager.h"
+#include "order_file_decoder.h"
+#include "platform/text_encoding.h"
+#include "shared/error_messages.h"
+#include "shared/exception_family.h"
+#include "sorted_file_reader.h"
+#include "sources/share_database.h"
+
+namespace qm {
+namespace {
+
+namespace fs = std::filesystem;
+
+enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
+
+constexpr int32_t kNull = 2147483647;
+
+using Rows = std::vector<std::vector<int32_t>>;
+using Entries = std::vector<test::ColumnEntry>;
+
+int32_t DateKey(int y, int m, int d) { return (y * 256 + m) * 256 + d; }
+int32_t TimeKey(int h, int m, int s) { return (h * 256 + m) * 256 + s; }
+int32_t Low(double v) {
+  return static_cast<int32_t>(static_cast<uint32_t>(std::bit_cast<uint64_t>(v)));
+}
+int32_t High(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v) >> 32); }
+
+class OrderBuildTest : public ::testing::TestWithParam<Source> {
+ protected:
+  void SetUp() override {
+    LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini");
+    fs::create_directories(Orders());
+    if (GetParam() == Source::SQLite) {
+      home_.Defs().SetConnectionString(
+          "Driver=SQLite3;Database=" + home_.Data() + "rows.db;StepAPI=1", "test");
+      return;
+    }
+    const char* name =
+        GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
+    const char* connection = std::getenv(name);
+    if (connection == nullptr || *connection == '\0') {
+      GTEST_SKIP() << name << " is not set: run through scripts/test, which starts PostgreSQL";
+    }
+    home_.Defs().SetConnectionString(connection, "test");
+  }
+
+  void TearDown() override { order_files::SetRenameHookForTesting({}); }
+
+  // A table name no other test process uses at the same time.
+  std::string Table(const char* columns) {
+    static int counter = 0;
+    const std::string name = "ob_" + std::to_string(getpid()) + "_" + std::to_string(++counter);
+    Run("CREATE TABLE " + name + " (" + columns + ")");
+    return name;
+  }
+
+  void Run(const std::string& sql) {
+    CShareDatabase db(home_.Defs());
+    db.Connect();
+    int16_t n = 0;
+    db.ExecuteSql(sql, n);
+  }
+
+  static COrderInfo Order(const std::string& name, const std::string& table,
+                          std::vector<std::string> columns) {
+    COrderInfo d;
+    d.OrderName = name;
+    d.TableName = table;
+    d.KeyColumn = "id";
+    for (auto& c : columns) d.Columns.push_back(OrderColumn{std::move(c), {}});
+    return d;
+  }
+
+  void Build(COrderInfo& d, bool rebuild = true, bool all = false) {
+    CPiOrder order(home_.Defs());
+    if (all) {
+      order.BuildOrderAll(d, rebuild);
+    } else {
+      order.BuildOrderInt(d, rebuild);
+    }
+  }
+
+  // The first message a host sees of the error a build raises.
+  std::string Failure(COrderInfo d, bool rebuild = true, bool all = false) {
+    try {
+      Build(d, rebuild, all);
+    } catch (const CException& e) {
+      const std::string text = e.GetFullTextUtf8(kLevelWritten);
+      return text.substr(0, text.find("\r\n"));
+    }
+    return "no error";
+  }
+
+  std::string Orders() const { return home_.Data() + "Groups/PUBLIC/Orders/"; }
+  std::string File(const std::string& name) const { return Orders() + name; }
+
+  std::vector<std::string> OrderFiles() const {
+    std::vector<std::string> names;
+    for (const auto& e : fs::directory_iterator(Orders())) names.push_back(e.path().filename());
+    std::sort(names.begin(), names.end());
+    return names;
+  }
+
+  // Every order file's size and a hash of its bytes, by name.
+  std::map<std::string, std::pair<std::size_t, std::size_t>> Snapshot() const {
+    std::map<std::string, std::pair<std::size_t, std::size_t>> files;
+    for (const std::string& name : OrderFiles()) {
+      const std::string bytes = test::ReadFile(File(name));
+      files[name] = {bytes.size(), std::hash<std::string>{}(bytes)};
+    }
+    return files;
+  }
+
+  Rows RowsOf(const std::string& name) {
+    const test::OrderHeader h = test::DecodeOrderHeader(File(name + ".sri"));
+    int width = 1;
+    for (const auto& c : h.columns) width += c.slots;
+    return test::DecodeOrderRows(File(name + ".srt"), width);
+  }
+
+  Entries ColumnOf(const std::string& order, const std::string& column) {
+    const test::OrderHeader h = test::DecodeOrderHeader(File(order + ".sri"));
+    for (const auto& c : h.columns) {
+      if (ToUpper(c.name) == column)
+        return test::DecodeColumnFile(File(order + "_" + column + ".col"), c.type);
+    }
+    ADD_FAILURE() << "no column " << column;
+    return {};
+  }
+
+  test::SortHome home_;
+};
+
+INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTest,
+                         ::testing::Values(Source::SQLite, Source::PostgresAnsi,
+                                           Source::PostgresUnicode));
+
+TEST_P(OrderBuildTest, NumericColumnsStoreTheirValuesPerKeyWithNullsLast) {
+  const std::string t = Table("id INTEGER, n INTEGER, r DOUBLE PRECISION, d TIMESTAMP");
+  Run("INSERT INTO " + t + " VALUES (3, 7, 2.5, '2024-02-29 13:45:59')");
+  Run("INSERT INTO " + t + " VALUES (1, NULL, -1.25, NULL)");
+  Run("INSERT INTO " + t + " VALUES (2, -4, NULL, '1999-12-31 23:59:58')");
+  COrderInfo d = Order("Prices", t, {"n", "r", "d"});
+  d.GeneralFlags = 2;  // save the connection
+  Build(d);
+
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"PRICES.sri", "PRICES.srt"}));
+  const test::OrderHeader h = test::DecodeOrderHeader(File("PRICES.sri"));
+  EXPECT_EQ(h.version, 614);
+  EXPECT_EQ(h.type, 1);
+  EXPECT_EQ(h.name, "Prices");
+  EXPECT_EQ(h.count, 3);
+  EXPECT_EQ(h.sort_max, 3);
+  ASSERT_EQ(h.columns.size(), 3u);
+  EXPECT_EQ((std::vector<int32_t>{h.columns[0].type, h.columns[0].first, h.columns[0].slots}),
+            (std::vector<int32_t>{1, 1, 1}));
+  EXPECT_EQ((std::vector<int32_t>{h.columns[1].type, h.columns[1].first, h.columns[1].slots}),
+            (std::vector<int32_t>{6, 2, 2}));
+  EXPECT_EQ((std::vector<int32_t>{h.columns[2].type, h.columns[2].first, h.columns[2].slots}),
+            (std::vector<int32_t>{3, 4, 2}));
+  EXPECT_EQ(RowsOf("PRICES"),
+            (Rows{{1, kNull, Low(-1.25), High(-1.25), kNull, 0},
+                  {2, -4, kNull, 0, DateKey(1999, 12, 31), TimeKey(23, 59, 58)},
+                  {3, 7, Low(2.5), High(2.5), DateKey(2024, 2, 29), TimeKey(13, 45, 59)}}));
+
+  // The header as the engine reads it.
+  CPiOrder order(home_.Defs());
+  order.OpenOrder("prices", CPiOrder::kModeRead);
+  EXPECT_EQ(order.Info().ConnectionString, home_.Defs().GetConnectionString());
+  EXPECT_EQ(order.Info().Columns, d.Columns);
+  EXPECT_GT(order.Info().BuildTime.year, 2000);
+  EXPECT_EQ(home_.Defs().GetProgress(), 100);
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
+TEST_P(OrderBuildTest, TextOrdersStoreDistinctPreparedValuesAndRanksNumbersSortAsNumbers) {
+  const std::string t = Table("id INTEGER, label VARCHAR(40), n INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, '-abc', 10), (2, 'ABC-', 9), (3, 'a-bc', NULL)");
+  Run("INSERT INTO " + t + " VALUES (4, NULL, 10), (5, 'b', -3)");
+  COrderInfo d = Order("Names", t, {"label", "n"});
+  d.GeneralFlags = 1;  // ignore case
+  d.IgnoreChars = u"-";
+  Build(d);
+
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"NAMES.sri", "NAMES.srt", "NAMES_LABEL.col", "NAMES_N.col"}));
+  const test::OrderHeader h = test::DecodeOrderHeader(File("NAMES.sri"));
+  EXPECT_EQ(h.type, 2);
+  EXPECT_EQ(h.count, 5);
+  ASSERT_EQ(h.columns.size(), 2u);
+  EXPECT_TRUE(h.columns[0].type == 2 || h.columns[0].type == 4) << h.columns[0].type;
+  EXPECT_EQ((std::vector<int32_t>{h.columns[1].type, h.columns[1].first, h.columns[1].slots}),
+            (std::vector<int32_t>{1, 2, 1}));
+  // -abc and ABC- are one value; a-bc keeps its inner hyphen.
+  EXPECT_EQ(ColumnOf("NAMES", "LABEL"), (Entries{{"A-BC", {3}}, {"ABC", {1, 2}}, {"B", {5}}}));
+  EXPECT_EQ(ColumnOf("NAMES", "N"), (Entries{{"-3", {5}}, {"9", {2}}, {"10", {1, 4}}}));
+  EXPECT_EQ(RowsOf("NAMES"), (Rows{{1, 1, 2}, {2, 1, 1}, {3, 0, kNull}, {4, kNull, 2}, {5, 2, 0}}));
+
+  // Case kept: only the trimming applies.
+  COrderInfo cased = Order("Cased", t, {"label"});
+  cased.IgnoreChars = u"-";
+  Build(cased);
+  EXPECT_EQ(ColumnOf("CASED", "LABEL"),
+            (Entries{{"ABC", {2}}, {"a-bc", {3}}, {"abc", {1}}, {"b", {5}}}));
+
+  // A numeric order built as ranks keeps its values' type.
+  COrderInfo numbers = Order("Numbers", t, {"n"});
+  Build(numbers, true, true);
+  EXPECT_EQ(numbers.OrderType, 2);
+  EXPECT_EQ(ColumnOf("NUMBERS", "N"), (Entries{{"-3", {5}}, {"9", {2}}, {"10", {1, 4}}}));
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
+TEST_P(OrderBuildTest, UpdatesReadLaterRowsAndReplaceTheRowsOfKeysReadAgain) {
+  const std::string t = Table("id INTEGER, label VARCHAR(40), n INTEGER, changed TIMESTAMP");
+  Run("INSERT INTO " + t + " VALUES (1, 'pear', 5, '2024-01-01 10:00:00')");
+  Run("INSERT INTO " + t + " VALUES (2, 'apple', 3, '2024-01-01 10:00:00')");
+  Run("INSERT INTO " + t + " VALUES (3, 'fig', 8, '2024-01-01 10:00:00')");
+  auto dated = [&](const char* name, const char* column) {
+    COrderInfo d = Order(name, t, {column});
+    d.UpdateFlags = 1;
+    d.DateTimeKeyColumn = "changed";
+    return d;
+  };
+  COrderInfo words = dated("Words", "label");
+  COrderInfo counts = dated("Counts", "n");
+  Build(words);
+  Build(counts);
+  EXPECT_EQ(ColumnOf("WORDS", "LABEL"), (Entries{{"apple", {2}}, {"fig", {3}}, {"pear", {1}}}));
+
+  Run("UPDATE " + t +
+      " SET label = 'zucchini', n = 50, changed = '2024-01-02 09:00:00' WHERE id = 1");
+  Run("INSERT INTO " + t + " VALUES (4, 'apple', 1, '2024-01-02 09:30:00')");
+  // Not read again: its change time is not later.
+  Run("UPDATE " + t + " SET label = 'kiwi', n = 0 WHERE id = 3");
+  COrderInfo words_update = dated("Words", "label");
+  COrderInfo counts_update = dated("Counts", "n");
+  Build(words_update, false);
+  Build(counts_update, false);
+
+  // pear had key 1 only: it goes, and every rank after it moves.
+  EXPECT_EQ(ColumnOf("WORDS", "LABEL"),
+            (Entries{{"apple", {2, 4}}, {"fig", {3}}, {"zucchini", {1}}}));
+  EXPECT_EQ(RowsOf("WORDS"), (Rows{{1, 2}, {2, 0}, {3, 1}, {4, 0}}));
+  EXPECT_EQ(RowsOf("COUNTS"), (Rows{{1, 50}, {2, 3}, {3, 8}, {4, 1}}));
+  EXPECT_EQ(counts_update.MaxDateTimeKey, (DateTimeValue{2024, 1, 2, 9, 30, 0, 0}));
+  EXPECT_EQ(counts_update.Count, 4);
+  EXPECT_EQ(test::DecodeOrderHeader(File("COUNTS.sri")).sort_max, 4);
+
+  // Nothing later: the update succeeds and changes no byte.
+  const auto before = Snapshot();
+  COrderInfo again = dated("Counts", "n");
+  Build(again, false);
+  EXPECT_EQ(Snapshot(), before);
+
+  // By key: only keys past the highest one are read.
+  COrderInfo by_key = Order("ByKey", t, {"n"});
+  Build(by_key);
+  Run("UPDATE " + t + " SET n = 77 WHERE id = 2");
+  Run("INSERT INTO " + t + " VALUES (5, 'plum', 6, NULL)");
+  COrderInfo by_key_update = Order("ByKey", t, {"n"});
+  Build(by_key_update, false);
+  EXPECT_EQ(RowsOf("BYKEY"), (Rows{{1, 50}, {2, 3}, {3, 0}, {4, 1}, {5, 6}}));
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
+TEST_P(OrderBuildTest, DropOrderRemovesEveryFile) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "drops do not depend on the driver";
+  const std::string t = Table("id INTEGER, a VARCHAR(10), b INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, 'x', 2)");
+  COrderInfo text = Order("Both", t, {"a", "b"});
+  COrderInfo values = Order("Values1", t, {"b"});
+  Build(text);
+  Build(values);
+  EXPECT_EQ(OrderFiles().size(), 6u);
+  for (const char* name : {"both", "VALUES1"}) {
+    CPiOrder order(home_.Defs());
+    order.OpenOrder(name, CPiOrder::kModeRead);
+    order.DropOrder();
+    EXPECT_FALSE(order.IsOpen());
+  }
+  EXPECT_TRUE(OrderFiles().empty());
+  CPiOrder gone(home_.Defs());
+  EXPECT_THROW(gone.OpenOrder("Both", CPiOrder::kModeRead), CPiOrderException);
+}
+
+TEST_P(OrderBuildTest, UpdatesThatChangeTheDefinitionAreRefusedUnlessRebuilt) {
+  if (GetParam() != Source::SQLite)
+    GTEST_SKIP() << "the definition check does not depend on the driver";
+  const std::string t = Table("id INTEGER, label VARCHAR(10), n INTEGER, r DOUBLE PRECISION");
+  Run("INSERT INTO " + t + " VALUES (1, 'x', 2, 0.5)");
+  COrderInfo d = Order("Shape", t, {"n"});
+  Build(d);
+  Run("INSERT INTO " + t + " VALUES (2, 'y', 3, 1.5)");
+  const auto before = Snapshot();
+  const std::string refused =
+      "Order definition changed, rebuild required (Module:PiOrderSort,Method:BuildOrderInt)";
+  EXPECT_EQ(Failure(Order("Shape", t, {"n", "label"}), false), refused);  // type and columns
+  EXPECT_EQ(Failure(Order("Shape", t, {"r"}), false), refused);           // row width
+  EXPECT_EQ(Failure(Order("Shape", t, {"label"}), false), refused);       // type
+  EXPECT_EQ(Failure(Order("Shape", t, {"n"}), false, true),
+            "Order definition changed, rebuild required (Module:PiOrderSort,Method:BuildOrderAll)");
+  EXPECT_EQ(Snapshot(), before);
+
+  // Rebuilds take any definition; the column files of the old one go.
+  COrderInfo text = Order("Shape", t, {"label", "n"});
+  Build(text);
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"SHAPE.sri", "SHAPE.srt", "SHAPE_LABEL.col", "SHAPE_N.col"}));
+  COrderInfo fewer = Order("Shape", t, {"n", "label"});
+  fewer.Columns.pop_back();
+  fewer.Columns.push_back(OrderColumn{"r", {}});
+  fewer.Columns.push_back(OrderColumn{"label", {}});
+  Build(fewer);
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"SHAPE.sri", "SHAPE.srt", "SHAPE_LABEL.col",
+                                                    "SHAPE_N.col", "SHAPE_R.col"}));
+  COrderInfo numbers = Order("Shape", t, {"r"});
+  Build(numbers);
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"SHAPE.sri", "SHAPE.srt"}));
+  EXPECT_EQ(RowsOf("SHAPE"), (Rows{{1, Low(0.5), High(0.5)}, {2, Low(1.5), High(1.5)}}));
+}
+
+TEST_P(OrderBuildTest, FailedBuildsLeaveTheOrderAsItWasAndNoTemporaryFile) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "failures do not depend on the driver";
+  const std::string t = Table("id INTEGER, label VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, 'x', 2), (2, 'y', 3)");
+  COrderInfo d = Order("Kept", t, {"label", "n"});
+  Build(d);
+  const auto before = Snapshot();
+
+  // The move fails once, on the .srt: the files already moved go back.
+  bool failed = false;
+  order_files::SetRenameHookForTesting([&failed](const std::string& target) {
+    if (failed || !target.ends_with("KEPT.srt")) return false;
+    return failed = true;
+  });
+  COrderInfo again = Order("Kept", t, {"label", "n"});
+  const std::string renaming = Failure(again);
+  EXPECT_TRUE(renaming.starts_with("Error renaming ")) << renaming;
+  EXPECT_NE(renaming.find("KEPT.srt (Module:PiOrder,Method:RenameOrder2)"), std::string::npos)
+      << renaming;
+  order_files::SetRenameHookForTesting({});
+  EXPECT_EQ(Snapshot(), before);
+
+  const std::string nulls = Table("id INTEGER, label VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + nulls + " VALUES (1, 'a', 1), (NULL, 'b', 2)");
+  EXPECT_EQ(Failure(Order("Kept", nulls, {"label"})),
+            "Unique key column contains NULL values (Module:PiOrderSort,Method:BuildOrderAll)");
+  EXPECT_EQ(Failure(Order("Other", nulls, {"n"})),
+            "Unique key column contains NULL values (Module:PiOrderSort,Method:BuildOrderInt)");
+  const std::string text_keys = Table("id VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + text_keys + " VALUES ('abc', 1)");
+  EXPECT_EQ(Failure(Order("Other", text_keys, {"n"})),
+            "Unique key is not numeric (Module:PiOrderSort,Method:BuildOrderInt)");
+  EXPECT_EQ(Failure(Order("Other", t, {"missing"})).rfind("no error", 0), std::string::npos);
+  const std::string blobs = Table("id INTEGER, data BLOB");
+  Run("INSERT INTO " + blobs + " VALUES (1, X'00')");
+  EXPECT_EQ(Failure(Order("Other", blobs, {"data"})),
+            "Column data holds binary data, which cannot be ordered "
+            "(Module:PiOrderSort,Method:BuildOrderInt)");
+
+  // No row: error 26 for a build; an update of an order is no failure.
+  const std::string empty = Table("id INTEGER, label VARCHAR(10)");
+  const std::string none = Failure(Order("Other", empty, {"label"}));
+  EXPECT_EQ(none.find("No rows were selected for the order"), 0u) << none;
+  EXPECT_NE(none.find("(Module:PiOrderSort,Method:BuildOrderAll)"), std::string::npos) << none;
+  EXPECT_EQ(Snapshot(), before);
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
+TEST_P(OrderBuildTest, NamesThatBecomeFileNamesAreChecked) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "names do not depend on the driver";
+  const std::string t = Table("id INTEGER, b_c VARCHAR(10), c VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, 'x', 'y', 3)");
+  const std::string path = Failure(Order("Escape", t, {"../n"}));
+  EXPECT_EQ(path.find("Invalid order column name \"../n\""), 0u) << path;
+  EXPECT_EQ(Failure(Order("../up", t, {"n"})).find("Invalid order name"), 0u);
+
+  COrderInfo a = Order("A", t, {"b_c"});
+  Build(a);
+  // A_B with column c would write A_B_C.col, which is order A's column b_c.
+  const std::string taken = Failure(Order("A_B", t, {"c"}));
+  EXPECT_EQ(taken.find(
+                "The column file A_B_C.col of order A_B, column c, belongs to order A, column b_c"),
+            0u)
+      << taken;
+  COrderInfo values = Order("A_B", t, {"n"});  // no column files: no collision
+  Build(values);
+  const std::string twice = Failure(Order("Twice", t, {"c", "C"}));
+  EXPECT_NE(twice.find("names column C twice"), std::string::npos) << twice;
+  EXPECT_EQ(OrderFiles(),
+            (std::vector<std::string>{"A.sri", "A.srt", "A_B.sri", "A_B.srt", "A_B_C.col"}));
+}
+
+TEST_P(OrderBuildTest, AKeyReadTwiceKeepsTheLastRowReadForIt) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "the row order is the data source's";
+  const std::string t = Table("seq INTEGER, id INTEGER, label VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, 7, 'b', 1), (2, 3, 'a', 2), (3, 7, 'c', 5)");
+  for (bool text : {false, true}) {
+    COrderInfo d = Order(text ? "Twice2" : "Twice1", t, {text ? "label" : "n"});
+    d.SqlUsedAsTable = 1;
+    d.SqlSelect = "select id, label, n from " + t + " order by seq";
+    Build(d);
+    EXPECT_EQ(d.Count, 2);
+    if (text) {
+      EXPECT_EQ(ColumnOf("TWICE2", "LABEL"), (Entries{{"a", {3}}, {"c", {7}}}));
+      EXPECT_EQ(RowsOf("TWICE2"), (Rows{{3, 0}, {7, 1}}));
+    } else {
+      EXPECT_EQ(RowsOf("TWICE1"), (Rows{{3, 2}, {7, 5}}));
+    }
+  }
+}
+
+TEST_P(OrderBuildTest, DamagedOrdersAreRefused) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "damage does not depend on the driver";
+  const std::string t = Table("id INTEGER, n INTEGER, label VARCHAR(10)");
+  Run("INSERT INTO " + t + " VALUES (1, 2, 'x')");
+  COrderInfo d = Order("Hurt", t, {"n"});
+  Build(d);
+  COrderInfo text = Order("Text", t, {"label"});
+  Build(text);
+  Run("INSERT INTO " + t + " VALUES (2, 3, 'y')");
+
+  // A row file whose size does not agree with its count.
+  std::string rows = test::ReadFile(File("HURT.srt"));
+  test::WriteFile(File("HURT.srt"), rows + "xx");
+  EXPECT_NE(Failure(Order("Hurt", t, {"n"}), false).find("Order file is damaged"),
+            std::string::npos);
+  // A column file that ends inside an entry.
+  std::string column = test::ReadFile(File("TEXT_LABEL.col"));
+  test::WriteFile(File("TEXT_LABEL.col"), column.substr(0, column.size() - 2));
+  EXPECT_NE(Failure(Order("Text", t, {"label"}), false).find("Order column file is damaged"),
+            std::string::npos);
+
+  std::string header = test::ReadFile(File("HURT.sri"));
+  header[6] = 0x58;  // version 600
+  header[7] = 0x02;
+  test::WriteFile(File("HURT.sri"), header);
+  CPiOrder order(home_.Defs());
+  try {
+    order.OpenOrder("Hurt", CPiOrder::kModeRead);
+    ADD_FAILURE() << "a damaged header was read";
+  } catch (const CPiOrderException& e) {
+    EXPECT_EQ(Utf16ToUtf8(e.GetCurrentEntry().text),
+              "Error reading order header (Module:PiOrder,Method:OpenOrder)");
+  }
+  EXPECT_FALSE(order.IsOpen());
+  // A rebuild replaces a damaged order whole.
+  COrderInfo rebuilt = Order("Hurt", t, {"n"});
+  Build(rebuilt);
+  EXPECT_EQ(RowsOf("HURT"), (Rows{{1, 2}, {2, 3}}));
+}
+
+TEST_P(OrderBuildTest, MovesAndDropsWaitForTheReadersOfTheOrder) {
+  if (GetParam() != Source::SQLite) GTEST_SKIP() << "locks do not depend on the driver";
+  const std::string t = Table("id INTEGER, label VARCHAR(10)");
+  Run("INSERT INTO " + t + " VALUES (1, 'x')");
+  COrderInfo d = Order("Locked", t, {"label"});
+  Build(d);
+  Run("INSERT INTO " + t + " VALUES (2, 'y')");
+  const auto before = Snapshot();
+  CLockManager::ScaleTimeoutsForTesting(0.001);
+  {
+    // A search reading the order holds a reader unit of its kind 3 lock.
+    CLockManager reader("PUBLIC", "locked", kLockOrder);
+    reader.LockReader();
+    EXPECT_EQ(Failure(Order("Locked", t, {"label"}), false),
+              "Could not get exclusive access to order LOCKED to put the new build in place "
+              "(Module:PiOrder,Method:RenameOrder2)");
+    CPiOrder order(home_.Defs());
+    order.OpenOrder("Locked", CPiOrder::kModeRead);
+    EXPECT_THROW(order.DropOrder(), CPiOrderException);
+    EXPECT_EQ(Snapshot(), before);
+  }
+  CLockManager::ScaleTimeoutsForTesting(1.0);
+  COrderInfo update = Order("Locked", t, {"label"});
+  Build(update, false);
+  EXPECT_EQ(ColumnOf("LOCKED", "LABEL"), (Entries{{"x", {1}}, {"y", {2}}}));
+}
+
+}  // namespace
+}  // namespace qm

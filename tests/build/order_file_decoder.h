@@ -1,0 +1,163 @@
+// Test-side reading of order files, written from their byte layout alone:
+// the header fields at the start of block 0 of NAME.sri, the rows of
+// NAME.srt and the entries of NAME_COLUMN.col. Little-endian throughout.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <bit>
+#include <cstdint>
+#include <cstdio>
+#include <string>
+#include <vector>
+
+#include "platform/text_encoding.h"
+#include "support/test_support.h"
+
+namespace qm::test {
+
+class LeReader {
+ public:
+  explicit LeReader(std::string bytes, std::size_t at = 0) : bytes_(std::move(bytes)), at_(at) {}
+
+  uint64_t Unsigned(int n) {
+    if (at_ + n > bytes_.size()) {
+      ADD_FAILURE() << "read past the end at " << at_;
+      at_ = bytes_.size();
+      return 0;
+    }
+    uint64_t v = 0;
+    for (int i = n - 1; i >= 0; --i) v = (v << 8) | static_cast<unsigned char>(bytes_[at_ + i]);
+    at_ += n;
+    return v;
+  }
+  int32_t I32() { return static_cast<int32_t>(static_cast<uint32_t>(Unsigned(4))); }
+  std::string Narrow() {
+    const std::size_t n = Unsigned(2);
+    std::string s = bytes_.substr(at_, n);
+    at_ += n;
+    return s;
+  }
+  std::string Wide() {
+    const std::size_t n = Unsigned(2);
+    std::u16string s;
+    for (std::size_t i = 0; i < n; ++i) s.push_back(static_cast<char16_t>(Unsigned(2)));
+    return Utf16ToUtf8(s);
+  }
+  bool AtEnd() const { return at_ >= bytes_.size(); }
+  std::size_t Size() const { return bytes_.size(); }
+
+ private:
+  std::string bytes_;
+  std::size_t at_;
+};
+
+struct HeaderColumn {
+  std::string name;
+  int32_t type = 0;   // value type code
+  int32_t first = 0;  // row column of its first slot
+  int32_t slots = 0;
+};
+
+struct OrderHeader {
+  int32_t version = 0;
+  std::string version_text;
+  int32_t type = 0;
+  std::string name;
+  std::string table;
+  int32_t sql_as_table = 0;
+  std::string sql;
+  std::vector<HeaderColumn> columns;
+  std::string key;
+  int32_t count = 0;
+  int32_t sort_max = 0;
+};
+
+// Block 0: used count (4 bytes), 2 bytes 0, then the fields.
+inline OrderHeader DecodeOrderHeader(const std::string& path) {
+  const std::string bytes = ReadFile(path);
+  EXPECT_EQ(bytes.size(), 4096u) << path;
+  LeReader r(bytes, 6);
+  OrderHeader h;
+  h.version = r.I32();
+  h.version_text = r.Narrow();
+  h.type = r.I32();
+  h.name = r.Narrow();
+  h.table = r.Narrow();
+  h.sql_as_table = r.I32();
+  h.sql = r.Narrow();
+  const int32_t n = r.I32();
+  for (int32_t i = 0; i < n; ++i) {
+    HeaderColumn c;
+    c.name = r.Narrow();
+    c.type = r.I32();
+    c.first = r.I32();
+    c.slots = r.I32();
+    h.columns.push_back(c);
+  }
+  h.key = r.Narrow();
+  h.count = r.I32();
+  h.sort_max = r.I32();
+  return h;
+}
+
+// The count, then count rows of width integers; the file holds nothing else.
+inline std::vector<std::vector<int32_t>> DecodeOrderRows(const std::string& path, int width) {
+  LeReader r(ReadFile(path));
+  const int32_t count = r.I32();
+  EXPECT_EQ(r.Size(), 4u + 4u * static_cast<std::size_t>(width) * count) << path;
+  std::vector<std::vector<int32_t>> rows(static_cast<std::size_t>(count));
+  for (auto& row : rows) {
+    for (int i = 0; i < width; ++i) row.push_back(r.I32());
+  }
+  return rows;
+}
+
+struct ColumnEntry {
+  std::string value;  // text as UTF-8, numbers in decimal, dates "Y-M-D h:m:s"
+  std::vector<int32_t> keys;
+  bool operator==(const ColumnEntry&) const = default;
+};
+
+inline std::ostream& operator<<(std::ostream& out, const ColumnEntry& e) {
+  out << "{" << e.value << ":";
+  for (int32_t k : e.keys) out << " " << k;
+  return out << "}";
+}
+
+// Entries: the value in the encoding of type, the key count, the keys.
+inline std::vector<ColumnEntry> DecodeColumnFile(const std::string& path, int32_t type) {
+  LeReader r(ReadFile(path));
+  std::vector<ColumnEntry> entries;
+  while (!r.AtEnd()) {
+    ColumnEntry e;
+    switch (type) {
+      case 2: e.value = r.Narrow(); break;
+      case 4: e.value = r.Wide(); break;
+      case 1: e.value = std::to_string(r.I32()); break;
+      case 6: {
+        char text[64];
+        std::snprintf(text, sizeof text, "%g", std::bit_cast<double>(r.Unsigned(8)));
+        e.value = text;
+        break;
+      }
+      case 3: {
+        const auto year = static_cast<int16_t>(r.Unsigned(2));
+        std::vector<uint64_t> f;
+        for (int i = 0; i < 5; ++i) f.push_back(r.Unsigned(2));
+        r.Unsigned(4);  // fraction
+        e.value = std::to_string(year) + "-" + std::to_string(f[0]) + "-" + std::to_string(f[1]) +
+                  " " + std::to_string(f[2]) + ":" + std::to_string(f[3]) + ":" +
+                  std::to_string(f[4]);
+        break;
+      }
+      default: ADD_FAILURE() << "no value type " << type; return entries;
+    }
+    const int32_t n = r.I32();
+    for (int32_t i = 0; i < n; ++i) e.keys.push_back(r.I32());
+    entries.push_back(std::move(e));
+  }
+  return entries;
+}
+
+}  // namespace qm::test

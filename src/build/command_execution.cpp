@@ -1,6 +1,7 @@
 #include "build/command_execution.h"
 
 #include <map>
+#include <optional>
 
 #include "build/command_locks.h"
 #include "build/command_translator.h"
@@ -304,10 +305,14 @@ void CommandExecution::BuildFindex(Command& command) {
       }
     }
   }
+  std::optional<CommandLock> delete_lock;
   if (rebuild) {
     // A rebuild reads every row again, whatever the findex held before.
     definition.SortMax = 0;
     definition.MaxDateTimeKey = DateTimeValue{};
+    // It forgets the deleted keys once it is in place: a DELETE waits until
+    // then, or a key deleted after its rows were read would be lost.
+    delete_lock.emplace(kCmdDeleteKey, name);
   }
   Trace(defs_.TraceLevel1(), kTraceTag, "Status 2. IndexBuildName: %s, Rebuild: %i, SortMax: %i",
         definition.IndexName, rebuild ? 1 : 0, definition.SortMax);

@@ -109,6 +109,15 @@ class FindexUpdateTest : public test::DataSourceTest {
     return keys;
   }
 
+  // Waits for a background build to trace line: written when the new files
+  // are complete and about to be moved into place.
+  void WaitForTrace(std::string_view line) {
+    for (int i = 0; i < 30000 && TraceText().find(line) == std::string::npos; ++i) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    }
+    ASSERT_NE(TraceText().find(line), std::string::npos) << TraceText();
+  }
+
   void WaitForJob() {
     for (int i = 0; i < 60000 && Progress() != 100; ++i) {
       std::this_thread::sleep_for(std::chrono::milliseconds(2));
@@ -306,6 +315,12 @@ TEST_P(FindexUpdateTest, DateTimeKeyUpdatesSelectTheRowsChangedAfterTheLastOneRe
   EXPECT_EQ(header.UpdateFlags, 1);
   EXPECT_EQ(header.MaxDateTimeKey, (DateTimeValue{2024, 1, 2, 10, 0, 0, 0}));
 
+  // Fewer than 2,000 words: updates rebuild it.
+  ASSERT_EQ(command_->CreateFindexEx(T("DatedFew"), T(select + " WHERE id <= 10"), T("body"),
+                                     T("id"), VARIANT_TRUE, T("changed")),
+            S_OK)
+      << LastError();
+
   // A row of an old key changed later is read again; a new key with an older
   // time is not.
   OnSource({"update " + dated +
@@ -320,6 +335,12 @@ TEST_P(FindexUpdateTest, DateTimeKeyUpdatesSelectTheRowsChangedAfterTheLastOneRe
   header = Header("DATED_ADD_1");
   EXPECT_EQ(header.MaxDateTimeKey, (DateTimeValue{2024, 1, 4, 8, 30, 15, 0}));
   EXPECT_EQ(header.DateTimeKeyColumn, "changed");
+  // A rebuild reads every row, whatever their times.
+  ASSERT_EQ(Run("UPDATE FINDEX DatedFew"), "");
+  EXPECT_FALSE(Exists("DATEDFEW_ADD_1.sdx"));
+  EXPECT_EQ(Keys("DATEDFEW"), Range(1, 10));
+  EXPECT_EQ(Header("DATEDFEW").MaxDateTimeKey, (DateTimeValue{2024, 1, 3, 9, 0, 0, 0}));
+
   const std::string traced = TraceText();
   EXPECT_NE(traced.find("as temp_table where changed>'2024-01-02 10:00:00'"), std::string::npos)
       << traced;
@@ -414,12 +435,7 @@ TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
   CLockManager search("PUBLIC", "Rows", kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows"), 0), S_OK);
-  // Traced when the add-on is written and about to be moved into place.
-  for (int i = 0; i < 30000 && TraceText().find("Renaming index: ROWS_ADD_1") == std::string::npos;
-       ++i) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-  }
-  ASSERT_NE(TraceText().find("Renaming index: ROWS_ADD_1"), std::string::npos);
+  WaitForTrace("Renaming index: ROWS_ADD_1");
   for (int i = 0; i < 50; ++i) {
     EXPECT_FALSE(Exists("ROWS_ADD_1.sdx"));
     EXPECT_LT(Progress(), 100);
@@ -429,6 +445,38 @@ TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
   WaitForJob();
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
   EXPECT_EQ(Keys("ROWS_ADD_1"), Range(701, 703));
+}
+
+TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
+  const std::string rows = Table("rows", "id integer, body varchar(100)");
+  Insert(rows, WordRows(1, 10));
+  ASSERT_EQ(Run("CREATE FINDEX Rows ON TABLE " + rows + " COLUMNS body KEY id"), "");
+  // A search holds the rebuild back just before it moves into place, after
+  // it has read row 3.
+  CLockManager search("PUBLIC", "Rows", kLockFindex);
+  search.LockReader();
+  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows REBUILD"), 0), S_OK);
+  WaitForTrace("Renaming index: Rows");
+  APICommand deleter;
+  ASSERT_EQ(deleter.SetDataPath(T(home_.Data())), S_OK);
+  ASSERT_EQ(deleter.ExecuteEx(T("DELETE FROM FINDEX Rows 3"), 0), S_OK);
+  for (int i = 0; i < 50; ++i) {
+    EXPECT_FALSE(Exists("ROWS.del")) << "the delete waits for the rebuild";
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  search.UnlockReaders();
+  WaitForJob();
+  EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
+  int32_t progress = 0;
+  for (int i = 0; i < 60000 && progress != 100; ++i) {
+    ASSERT_EQ(deleter.GetProgress(&progress), S_OK);
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  int32_t failed = -1;
+  ASSERT_EQ(deleter.GetErrorNumber(&failed), S_OK);
+  EXPECT_EQ(failed, 0);
+  EXPECT_EQ(Keys("ROWS"), Range(1, 10));
+  EXPECT_EQ(DeletedKeys("ROWS"), std::vector<int32_t>{3});
 }
 
 INSTANTIATE_TEST_SUITE_P(Sources, FindexUpdateTest,

@@ -109,13 +109,19 @@ class FindexUpdateTest : public test::DataSourceTest {
     return keys;
   }
 
-  // Waits for a background build to trace line: written when the new files
-  // are complete and about to be moved into place.
-  void WaitForTrace(std::string_view line) {
-    for (int i = 0; i < 30000 && TraceText().find(line) == std::string::npos; ++i) {
+  // Waits until line has been traced times times: "Renaming index: NAME" is
+  // written when a build's files are complete and about to move into place.
+  void WaitForTrace(std::string_view line, int times) {
+    auto count = [&] {
+      const std::string text = TraceText();
+      int n = 0;
+      for (auto at = text.find(line); at != std::string::npos; at = text.find(line, at + 1)) ++n;
+      return n;
+    };
+    for (int i = 0; i < 30000 && count() < times; ++i) {
       std::this_thread::sleep_for(std::chrono::milliseconds(2));
     }
-    ASSERT_NE(TraceText().find(line), std::string::npos) << TraceText();
+    ASSERT_EQ(count(), times) << TraceText();
   }
 
   void WaitForJob() {
@@ -435,7 +441,7 @@ TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
   CLockManager search("PUBLIC", "Rows", kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows"), 0), S_OK);
-  WaitForTrace("Renaming index: ROWS_ADD_1");
+  WaitForTrace("Renaming index: ROWS_ADD_1", 1);
   for (int i = 0; i < 50; ++i) {
     EXPECT_FALSE(Exists("ROWS_ADD_1.sdx"));
     EXPECT_LT(Progress(), 100);
@@ -456,7 +462,8 @@ TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   CLockManager search("PUBLIC", "Rows", kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows REBUILD"), 0), S_OK);
-  WaitForTrace("Renaming index: Rows");
+  WaitForTrace("Renaming index: Rows", 2);  // the CREATE's, then the rebuild's
+  OnSource({"delete from " + rows + " where id = 3"});
   APICommand deleter;
   ASSERT_EQ(deleter.SetDataPath(T(home_.Data())), S_OK);
   ASSERT_EQ(deleter.ExecuteEx(T("DELETE FROM FINDEX Rows 3"), 0), S_OK);

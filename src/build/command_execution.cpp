@@ -356,10 +356,8 @@ void CommandExecution::DropOrder(const std::string& name) {
 void CommandExecution::DeleteKey(const Command& command) {
   const std::string& name = command.findex.IndexName;
   RequirePlainName<CPiStartPointException>("findex", name, kExecuteW);
-  // Keys below 1 fall outside the key ranges of updates (they select keys
-  // above the highest one indexed, which starts at 0); they are refused here
-  // rather than accepted for a findex that could not be kept up to date by
-  // key.
+  // Findexes kept up to date by updates and deletes have keys of 1 and above:
+  // updates select the keys above the highest one indexed, which starts at 0.
   if (command.delete_key < 1) {
     throw CPiStartPointException::Text(
         "Cannot delete key %i from findex %s: deleted keys must be 1 or above", kExecuteW,

@@ -124,6 +124,10 @@ class FindexUpdateTest : public test::DataSourceTest {
     ASSERT_EQ(count(), times) << TraceText();
   }
 
+  // A findex name of this process alone: lock names are shared by every
+  // process, and these tests hold a findex's locks while other tests run.
+  static std::string HeldName() { return "Held" + std::to_string(getpid()); }
+
   void WaitForJob() {
     for (int i = 0; i < 60000 && Progress() != 100; ++i) {
       std::this_thread::sleep_for(std::chrono::milliseconds(2));
@@ -434,41 +438,45 @@ TEST_P(FindexUpdateTest, DeletesInAnyOrderLeaveASortedListWithoutDuplicates) {
 TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
   const std::string rows = Table("rows", "id integer, body varchar(100)");
   Insert(rows, WordRows(1, 700));
-  ASSERT_EQ(Run("CREATE FINDEX Rows ON TABLE " + rows + " COLUMNS body KEY id"), "");
+  const std::string name = HeldName();
+  ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
   Insert(rows, WordRows(701, 703));
   // A search of the findex holds a reader unit of its findex lock; the add-on
   // files are read under that lock.
-  CLockManager search("PUBLIC", "Rows", kLockFindex);
+  CLockManager search("PUBLIC", name, kLockFindex);
   search.LockReader();
-  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows"), 0), S_OK);
-  WaitForTrace("Renaming index: ROWS_ADD_1", 1);
+  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name), 0), S_OK);
+  const std::string add_on = ToUpper(name) + "_ADD_1";
+  WaitForTrace("Renaming index: " + add_on, 1);
   for (int i = 0; i < 50; ++i) {
-    EXPECT_FALSE(Exists("ROWS_ADD_1.sdx"));
+    EXPECT_FALSE(Exists(add_on + ".sdx"));
     EXPECT_LT(Progress(), 100);
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   search.UnlockReaders();
   WaitForJob();
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
-  EXPECT_EQ(Keys("ROWS_ADD_1"), Range(701, 703));
+  EXPECT_EQ(Keys(add_on), Range(701, 703));
 }
 
 TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   const std::string rows = Table("rows", "id integer, body varchar(100)");
   Insert(rows, WordRows(1, 10));
-  ASSERT_EQ(Run("CREATE FINDEX Rows ON TABLE " + rows + " COLUMNS body KEY id"), "");
+  const std::string name = HeldName();
+  ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
   // A search holds the rebuild back just before it moves into place, after
   // it has read row 3.
-  CLockManager search("PUBLIC", "Rows", kLockFindex);
+  CLockManager search("PUBLIC", name, kLockFindex);
   search.LockReader();
-  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Rows REBUILD"), 0), S_OK);
-  WaitForTrace("Renaming index: Rows", 2);  // the CREATE's, then the rebuild's
+  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name + " REBUILD"), 0), S_OK);
+  WaitForTrace("Renaming index: " + name, 2);  // the CREATE's, then the rebuild's
   OnSource({"delete from " + rows + " where id = 3"});
   APICommand deleter;
   ASSERT_EQ(deleter.SetDataPath(T(home_.Data())), S_OK);
-  ASSERT_EQ(deleter.ExecuteEx(T("DELETE FROM FINDEX Rows 3"), 0), S_OK);
+  ASSERT_EQ(deleter.ExecuteEx(T("DELETE FROM FINDEX " + name + " 3"), 0), S_OK);
+  const std::string upper = ToUpper(name);
   for (int i = 0; i < 50; ++i) {
-    EXPECT_FALSE(Exists("ROWS.del")) << "the delete waits for the rebuild";
+    EXPECT_FALSE(Exists(upper + ".del")) << "the delete waits for the rebuild";
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   search.UnlockReaders();
@@ -482,8 +490,8 @@ TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   int32_t failed = -1;
   ASSERT_EQ(deleter.GetErrorNumber(&failed), S_OK);
   EXPECT_EQ(failed, 0);
-  EXPECT_EQ(Keys("ROWS"), Range(1, 10));
-  EXPECT_EQ(DeletedKeys("ROWS"), std::vector<int32_t>{3});
+  EXPECT_EQ(Keys(upper), Range(1, 10));
+  EXPECT_EQ(DeletedKeys(upper), std::vector<int32_t>{3});
 }
 
 INSTANTIATE_TEST_SUITE_P(Sources, FindexUpdateTest,

@@ -1,5 +1,8 @@
 #include "build/command_execution.h"
 
+#include <map>
+#include <optional>
+
 #include "build/command_locks.h"
 #include "build/command_translator.h"
 #include "build/command_type.h"
@@ -92,6 +95,62 @@ void RequireBuildableOrder(const COrderInfo& definition, const CGlobalDefs& defs
                            const char* method) {
   RequirePlainName<CPiStartPointException>("order", definition.OrderName, method);
   RequireFitsHeaderBlock(definition, defs, "order", method);
+}
+
+namespace {
+
+std::string UpperTags(const TagMap& tags) {
+  std::string out;
+  for (const auto& [tag, value] : tags) out += ":" + ToUpper(tag) + "=" + value;
+  return out;
+}
+
+// The columns with their tags, names compared in upper case, tag values as
+// written (a base path or address is case-sensitive).
+std::map<std::string, std::string> ComparableColumns(const ColumnMap& columns) {
+  std::map<std::string, std::string> out;
+  for (const auto& [column, tags] : columns) out.emplace(ToUpper(column), UpperTags(tags));
+  return out;
+}
+
+std::string ColumnsWithTags(const ColumnMap& columns) {
+  std::string out;
+  for (const auto& [column, tags] : columns) {
+    if (!out.empty()) out += ',';
+    out += column;
+    for (const auto& [tag, value] : tags) out += ":" + tag + "=" + value;
+  }
+  return out;
+}
+
+std::string SourceText(const CIndexHeader& h) {
+  return h.SqlUsedAsTable != 0 ? "the SQL select " + h.SqlSelect : "table " + h.TableName;
+}
+
+}  // namespace
+
+void RequireUpdatableBy(const CIndexHeader& asked, const CIndexHeader& existing) {
+  const int32_t missing_bits = asked.GeneralFlags & kPostingLayoutBits & ~existing.GeneralFlags;
+  if (missing_bits != 0) {
+    throw CPiStartPointException::Numbered(kErrOptionsDoNotFit, kExecuteW, nullptr);
+  }
+  const bool same_source =
+      asked.SqlUsedAsTable == existing.SqlUsedAsTable &&
+      (asked.SqlUsedAsTable != 0 ? ToUpper(asked.SqlSelect) == ToUpper(existing.SqlSelect)
+                                 : ToUpper(asked.TableName) == ToUpper(existing.TableName));
+  if (same_source && ToUpper(asked.KeyColumn) == ToUpper(existing.KeyColumn) &&
+      ComparableColumns(asked.Columns) == ComparableColumns(existing.Columns)) {
+    return;
+  }
+  // Add-ons are read together with their findex: rows indexed from another
+  // source, key or columns would not belong to it.
+  const auto cause = CPiStartPointException::Text(
+      "The update names %s with key %s and columns %s, but findex %s was built on %s with key "
+      "%s and columns %s. Use CREATE FINDEX to change the definition",
+      kExecuteW, nullptr, SourceText(asked), asked.KeyColumn, ColumnsWithTags(asked.Columns),
+      existing.IndexName, SourceText(existing), existing.KeyColumn,
+      ColumnsWithTags(existing.Columns));
+  throw CPiStartPointException::Numbered(kErrOptionsDoNotFit, kExecuteW, &cause);
 }
 
 CommandExecution::CommandExecution(CGlobalDefs& defs, std::atomic<bool>& data_path_valid,
@@ -196,36 +255,36 @@ void CommandExecution::BuildFindex(Command& command) {
   const CommandLock lock(command.type, name);
 
   const bool stored = command.type == kCmdFindexStored;
+  const bool update = command.create == 0;
   bool rebuild = command.rebuild != 0;
-  auto check_options = [&](const CIndexHeader& existing) {
-    const int32_t asked = definition.GeneralFlags & kPostingLayoutBits;
-    if ((asked & ~existing.GeneralFlags) != 0) {
-      throw CPiStartPointException::Numbered(kErrOptionsDoNotFit, kExecuteW, nullptr);
-    }
-  };
 
-  if (rebuild) {
-    if (stored) {
-      definition = ReadFindexHeader(defs_, name);
-    } else if (command.create == 0) {
-      check_options(ReadFindexHeader(defs_, name));
-    }
-  } else {
-    const CIndexHeader existing = ReadFindexHeader(defs_, name);
+  if (rebuild && stored) {
+    // CREATE FINDEX name, UPDATE FINDEX name REBUILD.
+    definition = ReadFindexHeader(defs_, name);
+  } else if (rebuild && update) {
+    // UPDATE ... ON TABLE ... REBUILD: the statement's options over the
+    // stored definition, which keeps what a statement cannot name (the
+    // date/time update key, the stored connection).
+    CIndexHeader existing = ReadFindexHeader(defs_, name);
+    RequireUpdatableBy(definition, existing);
+    definition = std::move(existing);
+    index_options_.CopyTo(definition);
+  } else if (!rebuild) {
+    CIndexHeader existing = ReadFindexHeader(defs_, name);
     Trace(defs_.TraceLevel1(), kTraceTag,
           "Status 1. IndexName: %s, Rebuild: %i, SortMax: %i, Count: %i", name, command.rebuild,
           existing.SortMax, existing.WordCount);
-    if (stored) {
-      definition = existing;
-    } else {
-      check_options(existing);
-    }
-    if (existing.WordCount < kAddOnWordThreshold) {
+    if (!stored) RequireUpdatableBy(definition, existing);
+    // The new rows are indexed as the findex was: its stored definition and
+    // options, whatever the current options are.
+    definition = std::move(existing);
+    // Below 1 no key range is known: every row is read again.
+    if (definition.WordCount < kAddOnWordThreshold || definition.SortMax < 1) {
       rebuild = true;
     } else {
       // The first add-on with room takes the rows above the findex before it.
-      int32_t sort_max = existing.SortMax;
-      DateTimeValue max_date_time = existing.MaxDateTimeKey;
+      int32_t sort_max = definition.SortMax;
+      DateTimeValue max_date_time = definition.MaxDateTimeKey;
       for (int32_t n = 1;; ++n) {
         const std::string add_on = findex::AddOnName(name, n);
         CIndexHeader add_on_header;
@@ -243,10 +302,14 @@ void CommandExecution::BuildFindex(Command& command) {
       }
     }
   }
+  std::optional<CommandLock> delete_lock;
   if (rebuild) {
     // A rebuild reads every row again, whatever the findex held before.
     definition.SortMax = 0;
     definition.MaxDateTimeKey = DateTimeValue{};
+    // It forgets the deleted keys once it is in place: a DELETE waits until
+    // then, or a key deleted after its rows were read would be lost.
+    delete_lock.emplace(kCmdDeleteKey, name);
   }
   Trace(defs_.TraceLevel1(), kTraceTag, "Status 2. IndexBuildName: %s, Rebuild: %i, SortMax: %i",
         definition.IndexName, rebuild ? 1 : 0, definition.SortMax);
@@ -313,6 +376,13 @@ void CommandExecution::DropOrder(const std::string& name) {
 void CommandExecution::DeleteKey(const Command& command) {
   const std::string& name = command.findex.IndexName;
   RequirePlainName<CPiStartPointException>("findex", name, kExecuteW);
+  // Findexes kept up to date by updates and deletes have keys of 1 and above:
+  // updates select the keys above the highest one indexed, which starts at 0.
+  if (command.delete_key < 1) {
+    throw CPiStartPointException::Text(
+        "Cannot delete key %i from findex %s: deleted keys must be 1 or above", kExecuteW,
+        nullptr, command.delete_key, name);
+  }
   const CommandLock lock(kCmdDeleteKey, name);
   // A key deleted from a findex that is not there would be reported done
   // while no search ever subtracts it.

@@ -80,4 +80,10 @@ void RequireBuildableFindex(const CIndexHeader& definition, const CGlobalDefs& d
 void RequireBuildableOrder(const COrderInfo& definition, const CGlobalDefs& defs,
                            const char* method);
 
+// What an UPDATE FINDEX ... ON TABLE must name to update an existing findex:
+// its table (or SQL select), key column and columns with their tags (names
+// compared in upper case), and no score or phrase support that the findex
+// lacks. Raises error 10 otherwise.
+void RequireUpdatableBy(const CIndexHeader& asked, const CIndexHeader& existing);
+
 }  // namespace qm

@@ -112,11 +112,20 @@ void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
   Guarded("BuildRowFindex", [&] {
     findex::CheckFindexName(definition.IndexName, "BuildRowFindex");
     MFile sorted;  // delete-on-close: gone once closed
+    int64_t rows = 0;
     try {
-      CPiSort(defs_).SortFindexTable(definition, sorted);
+      // An update that finds no new row is done; a rebuild must index rows.
+      rows = CPiSort(defs_).SortFindexTable(
+          definition, sorted, rebuild ? CPiSort::NoRows::Raise : CPiSort::NoRows::Allow);
     } catch (...) {
       Trace(true, "PILIB_ERROR.PiFindex.BuildRowFindex", "SortFindexTable failed");
       throw;
+    }
+    if (rows == 0) {
+      Trace(defs_.TraceLevel1(), kTraceTag, "No new rows for %s, nothing to update",
+            definition.IndexName);
+      defs_.SetProgress(100);
+      return;
     }
     BuildFromSorted(definition, sorted, rebuild);
   });

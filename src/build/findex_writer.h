@@ -40,7 +40,9 @@ class CPiFIndex {
 
   // Sorts the rows of definition's SELECT (from definition.SortMax on, for an
   // update), writes the word tree and postings under temporary names and moves
-  // them into place under the findex name of the definition.
+  // them into place under the findex name of the definition. A rebuild that
+  // selects no row raises error 47; an update (rebuild false) that selects
+  // none leaves every file as it was.
   void BuildRowFindex(CIndexHeader& definition, bool rebuild);
   // The second half of BuildRowFindex: writes the findex of the sorted entry
   // file (read from its current position; see build/word_sort.h) under

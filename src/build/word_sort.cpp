@@ -302,8 +302,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
   return rows;
 }
 
-void CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted) {
-  Guard<CPiSortException, CPiSortUnknownException>("SortFindexTable", [&] {
+int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows no_rows) {
+  return Guard<CPiSortException, CPiSortUnknownException>("SortFindexTable", [&] {
     // The connection stored with the findex serves when the caller set none;
     // the caller's settings stay as they are.
     CGlobalDefs source(defs_);
@@ -319,13 +319,17 @@ void CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted) {
       CEntrySort::OpenSortFile(defs_, raw);
       rows = WriteFindexRows(database, raw, definition);
     }
-    if (rows == 0) throw CPiSortException::Numbered(kNoRowsSelected, "SortFindexTable", nullptr);
+    if (rows == 0) {
+      if (no_rows == NoRows::Allow) return rows;
+      throw CPiSortException::Numbered(kNoRowsSelected, "SortFindexTable", nullptr);
+    }
     defs_.SetProgress(15);
 
     const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
     CEntrySort sort(defs_, SortEntryLayout(set.Width(), static_cast<VALUE_TYPE>(definition.FindexType)),
                     CEntrySort::Module::PiSort);
     sort.Sort(raw, sorted);
+    return rows;
   });
 }
 

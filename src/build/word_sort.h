@@ -23,12 +23,17 @@ class CPiSort {
  public:
   explicit CPiSort(CGlobalDefs& defs);
 
-  // Selects, writes and sorts. On return sorted is open for reading at its
-  // start (a delete-on-close temporary file) and definition holds what the
-  // rows gave: FindexType, SortMax, KeyCount (rows read), MaxDateTimeKey,
-  // BuildTime and LastUpdateTime. Progress goes to the settings: 5, 15, 20,
-  // then 20 + (70 div n) x n per merge pass. No row raises error 47.
-  void SortFindexTable(CIndexHeader& definition, MFile& sorted);
+  // What a selection without rows means: error 47 for a build that must
+  // index something (CREATE, rebuilds), nothing new for an update.
+  enum class NoRows { Raise, Allow };
+
+  // Selects, writes and sorts; returns the rows read. On return sorted is
+  // open for reading at its start (a delete-on-close temporary file) and
+  // definition holds what the rows gave: FindexType, SortMax, KeyCount (rows
+  // read), MaxDateTimeKey, BuildTime and LastUpdateTime. Progress goes to the
+  // settings: 5, 15, 20, then 20 + (70 div n) x n per merge pass. No row
+  // raises error 47, or with NoRows::Allow returns 0 with sorted not opened.
+  int64_t SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows no_rows = NoRows::Raise);
 
  private:
   // Runs the selection's statements in order, each only when the one before

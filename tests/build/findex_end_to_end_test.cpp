@@ -4,119 +4,26 @@
 // errors, background builds, every information value, updates into add-ons
 // and rebuilds, deletes and drops.
 #include <gtest/gtest.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
-#include <cstdlib>
 #include <filesystem>
 #include <regex>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include "api/command_fixture.h"
+#include "build/data_source_fixture.h"
 
 namespace qm {
 namespace {
 
 namespace fs = std::filesystem;
 
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
+using test::Source;
+using test::SourceName;
 
-std::string SourceName(const ::testing::TestParamInfo<Source>& info) {
-  switch (info.param) {
-    case Source::SQLite: return "SQLite";
-    case Source::PostgresAnsi: return "PostgresAnsi";
-    default: return "PostgresUnicode";
-  }
-}
-
-class FindexEndToEndTest : public test::CommandFixture,
-                           public ::testing::WithParamInterface<Source> {
- protected:
-  void SetUp() override {
-    CommandFixture::SetUp();
-    // The language data of the data directory, as quillmere init lays it out.
-    fs::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
-             fs::copy_options::recursive);
-    if (GetParam() == Source::SQLite) {
-      connection_ = SqliteConnection();
-    } else {
-      const char* variable =
-          GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-      const char* value = std::getenv(variable);
-      if (value == nullptr || *value == '\0') {
-        GTEST_SKIP() << variable << " is not set: scripts/test starts PostgreSQL";
-      }
-      connection_ = value;
-    }
-    ASSERT_EQ(command_->SetDBConnectionStringEx(T(connection_), T("Books Source")), S_OK)
-        << LastError();
-    // Table names of their own: PostgreSQL is shared by the test processes.
-    prefix_ = "e2e_" + std::to_string(getpid()) + "_";
-  }
-
-  void TearDown() override {
-    if (!connection_.empty()) {
-      for (const std::string& table : tables_) OnSource({"drop table " + table});
-    }
-    CommandFixture::TearDown();
-  }
-
-  // Runs statements on the test's data source.
-  void OnSource(const std::vector<std::string>& statements) {
-    CGlobalDefs defs = Defs();
-    defs.SetConnectionString(connection_, "test");
-    CShareDatabase database(defs);
-    database.Connect();
-    for (const auto& statement : statements) {
-      int16_t columns = 0;
-      database.ExecuteSql(statement, columns);
-    }
-    database.Disconnect();
-  }
-
-  // A table of this test, created with columns and filled with rows.
-  std::string Table(const std::string& stem, const std::string& columns,
-                    const std::vector<std::string>& rows = {}) {
-    const std::string name = prefix_ + stem;
-    std::vector<std::string> statements{"create table " + name + " (" + columns + ")"};
-    for (const std::string& row : rows) {
-      statements.push_back("insert into " + name + " values (" + row + ")");
-    }
-    OnSource(statements);
-    tables_.push_back(name);
-    return name;
-  }
-
-  // Rows id, "w<id>a w<id>b w<id>c": three distinct words each.
-  void AddWordRows(const std::string& table, int from, int to) {
-    std::vector<std::string> statements;
-    std::string values;
-    for (int id = from; id <= to; ++id) {
-      const std::string w = "w" + std::to_string(id);
-      if (!values.empty()) values += ",";
-      values += "(" + std::to_string(id) + ",'" + w + "a " + w + "b " + w + "c')";
-      if (id % 200 == 0 || id == to) {
-        statements.push_back("insert into " + table + " values " + values);
-        values.clear();
-      }
-    }
-    OnSource(statements);
-  }
-
-  std::string Info(const std::string& findex, int32_t value) {
-    EXPECT_EQ(command_->SetCurrentObjectName(T(findex)), S_OK);
-    BSTR text = u"untouched";
-    EXPECT_EQ(command_->GetFindexInfo(value, &text), S_OK) << LastError();
-    return Utf16ToUtf8(text);
-  }
-
-  std::string connection_;
-  std::string prefix_;
-  std::vector<std::string> tables_;
-};
+class FindexEndToEndTest : public test::DataSourceTest {};
 
 TEST_P(FindexEndToEndTest, CreateFindexWithWeightsAndTagsAndEveryInformationValue) {
   const std::string books = Table(

@@ -158,6 +158,42 @@ TEST_F(EngineCommandsTest, ExecBuildsAFindexThatInfoExistsAndDropSee) {
   EXPECT_EQ(Host({"exists", "Books"}).out, "no\n");
 }
 
+TEST_F(EngineCommandsTest, ExecUpdatesAFindexAndDeletesKeysInAnyOrder) {
+  ASSERT_EQ(Host({"init"}).status, 0);
+  const std::string connect = "Driver=SQLite3;Database=" + dir_.Path() + "books.db;StepAPI=1;";
+  CGlobalDefs defs;
+  defs.SetConnectionString(connect, "books");
+  auto sql = [&](const std::string& statement) {
+    CShareDatabase db(defs);
+    db.Connect();
+    int16_t columns = 0;
+    db.ExecuteSql(statement, columns);
+    db.Disconnect();
+  };
+  sql("create table books (id integer, title varchar(50))");
+  sql("insert into books values (1, 'River fish'), (2, 'Mountain')");
+  ASSERT_EQ(Host({"--connect", connect, "exec",
+                  "CREATE FINDEX Books ON TABLE books COLUMNS title KEY id"})
+                .status,
+            0);
+  sql("insert into books values (3, 'Quiet lake'), (4, 'Stone')");
+  Result r = Host({"--connect", connect, "exec", "UPDATE", "FINDEX", "Books"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_NE(Host({"info", "findex", "Books"}).out.find("idxKeyCount\t4\n"), std::string::npos);
+
+  for (const char* key : {"30", "10", "20", "10"}) {
+    r = Host({"exec", std::string("DELETE FROM FINDEX Books ") + key});
+    EXPECT_EQ(r.status, 0) << key << r.err;
+  }
+  const std::string del = dir_.Path() + "data/Groups/PUBLIC/Indexes/BOOKS.del";
+  const std::string sorted{3, 0, 0, 0, 10, 0, 0, 0, 20, 0, 0, 0, 30, 0, 0, 0};
+  EXPECT_EQ(test::ReadFile(del), sorted);
+  r = Host({"exec", "DELETE FROM FINDEX Books -1"});
+  EXPECT_EQ(r.status, 1);
+  EXPECT_NE(r.err.find("deleted keys must be 1 or above"), std::string::npos) << r.err;
+  EXPECT_EQ(test::ReadFile(del), sorted);
+}
+
 TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {
   // Standard output is not a terminal here: one line per percentage shown.
   Result r = Host({"exec", "--background", "UPDATE FINDEX Books"});

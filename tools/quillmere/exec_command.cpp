@@ -20,10 +20,13 @@ constexpr int kBarWidth = 40;
 void PrintHelp() {
   std::printf(
       "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
-      "Runs a command statement (CREATE FINDEX, UPDATE FINDEX, DROP FINDEX, CREATE ORDER,\n"
-      "UPDATE ORDER, DROP ORDER, CONNECT, SET GROUP, SET CONNECTIONSTRING, CREATE INDEX\n"
-      "...) and waits for it. Several arguments are joined with blanks into one\n"
-      "statement.\n\n"
+      "Runs a command statement (CREATE FINDEX, UPDATE FINDEX, DELETE FROM FINDEX,\n"
+      "DROP FINDEX, CREATE ORDER, UPDATE ORDER, DROP ORDER, CONNECT, SET GROUP,\n"
+      "SET CONNECTIONSTRING, CREATE INDEX ...) and waits for it. Several arguments\n"
+      "are joined with blanks into one statement.\n\n"
+      "UPDATE FINDEX NAME indexes the rows added since the last build (keys above the\n"
+      "highest one indexed); DELETE FROM FINDEX NAME KEY hides a row's key from\n"
+      "searches until the next rebuild. Both need keys of 1 and above.\n\n"
       "With --background the statement runs as a background job; the host polls its\n"
       "progress, drawing a bar on a terminal and printing a line per percentage\n"
       "otherwise, then reports the job's error, if any.\n\n"

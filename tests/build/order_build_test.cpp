@@ -12,6 +12,7 @@
 #include <functional>
 #include <map>
 
+#include "build/file_swap.h"
 #include "build/order_file_set.h"
 #include "build/pi_order.h"
 #include "locks/lock_manager.h"
@@ -60,7 +61,7 @@ class OrderBuildTest : public ::testing::TestWithParam<Source> {
     home_.Defs().SetConnectionString(connection, "test");
   }
 
-  void TearDown() override { order_files::SetRenameHookForTesting({}); }
+  void TearDown() override { file_swap::SetRenameHookForTesting({}); }
 
   // A table name no other test process uses at the same time.
   std::string Table(const char* columns) {
@@ -346,7 +347,7 @@ TEST_P(OrderBuildTest, FailedBuildsLeaveTheOrderAsItWasAndNoTemporaryFile) {
 
   // The move fails once, on the .srt: the files already moved go back.
   bool failed = false;
-  order_files::SetRenameHookForTesting([&failed](const std::string& target) {
+  file_swap::SetRenameHookForTesting([&failed](const std::string& target) {
     if (failed || !target.ends_with("KEPT.srt")) return false;
     return failed = true;
   });
@@ -355,7 +356,7 @@ TEST_P(OrderBuildTest, FailedBuildsLeaveTheOrderAsItWasAndNoTemporaryFile) {
   EXPECT_TRUE(renaming.starts_with("Error renaming ")) << renaming;
   EXPECT_NE(renaming.find("KEPT.srt (Module:PiOrder,Method:RenameOrder2)"), std::string::npos)
       << renaming;
-  order_files::SetRenameHookForTesting({});
+  file_swap::SetRenameHookForTesting({});
   EXPECT_EQ(Snapshot(), before);
 
   const std::string nulls = Table("id INTEGER, label VARCHAR(10), n INTEGER");

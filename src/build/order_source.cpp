@@ -64,20 +64,8 @@ OrderSource::OrderSource(CGlobalDefs& defs, const COrderInfo& definition, const 
   database_->Connect();
 
   const RowSelection selection = SelectionOf(definition);
-  const std::vector<std::string> statements = selection.Statements();
   start_time_ = SystemTimeToSQLTime(platform::CurrentLocalTime());
-  for (std::size_t i = 0; i < statements.size(); ++i) {
-    Trace(defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData", "Executing SQL. SQL: %s",
-          statements[i]);
-    try {
-      int16_t columns = 0;
-      database_->ExecuteSql(statements[i], columns);
-      break;
-    } catch (const CShareDatabaseException&) {
-      // The date literal forms differ between data sources: try the next one.
-      if (i + 1 == statements.size()) throw;
-    }
-  }
+  selection.Execute(*database_, defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData");
 
   CShareDatabase& db = *database_;
   auto require = [&](const std::string& name) {

@@ -137,21 +137,10 @@ class EntryWriter {
 CPiSort::CPiSort(CGlobalDefs& defs) : defs_(defs) {}
 
 void CPiSort::ExecuteSelect(CShareDatabase& database, CIndexHeader& definition) {
-  const std::vector<std::string> statements = RowSelection::FromHeader(definition).Statements();
   const DateTimeValue now = SystemTimeToSQLTime(platform::CurrentLocalTime());
   definition.BuildTime = now;
   definition.LastUpdateTime = now;
-  for (std::size_t i = 0; i < statements.size(); ++i) {
-    Trace(defs_.TraceLevel1(), kSortTag, "Executing SQL. SQL: %s", statements[i]);
-    try {
-      int16_t columns = 0;
-      database.ExecuteSql(statements[i], columns);
-      return;
-    } catch (const CShareDatabaseException&) {
-      // The date literal forms differ between data sources: try the next one.
-      if (i + 1 == statements.size()) throw;
-    }
-  }
+  RowSelection::FromHeader(definition).Execute(database, defs_.TraceLevel1(), kSortTag);
 }
 
 int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHeader& definition) {

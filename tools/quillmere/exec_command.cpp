@@ -76,7 +76,7 @@ int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
   bool background = false;
   std::string statement;
   for (const std::string& a : args) {
-    if (statement.empty() && (a == "--help" || a == "-h")) {
+    if (statement.empty() && IsHelpFlag(a)) {
       PrintHelp();
       return kExitOk;
     }

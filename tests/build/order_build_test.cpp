@@ -21,14 +21,14 @@
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 #include "sorted_file_reader.h"
-#include "sources/share_database.h"
+#include "test_sources.h"
 
 namespace qm {
 namespace {
 
 namespace fs = std::filesystem;
 
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
+using test::Source;
 
 constexpr int32_t kNull = 2147483647;
 
@@ -42,41 +42,16 @@ int32_t Low(double v) {
 }
 int32_t High(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v) >> 32); }
 
-class OrderBuildTest : public ::testing::TestWithParam<Source> {
+class OrderBuildTest : public test::SourceRowsTest {
  protected:
+  OrderBuildTest() : SourceRowsTest("ob_") {}
+
   void SetUp() override {
-    LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini");
     fs::create_directories(Orders());
-    if (GetParam() == Source::SQLite) {
-      home_.Defs().SetConnectionString(
-          "Driver=SQLite3;Database=" + home_.Data() + "rows.db;StepAPI=1", "test");
-      return;
-    }
-    const char* name =
-        GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-    const char* connection = std::getenv(name);
-    if (connection == nullptr || *connection == '\0') {
-      GTEST_SKIP() << name << " is not set: run through scripts/test, which starts PostgreSQL";
-    }
-    home_.Defs().SetConnectionString(connection, "test");
+    SourceRowsTest::SetUp();
   }
 
   void TearDown() override { file_swap::SetRenameHookForTesting({}); }
-
-  // A table name no other test process uses at the same time.
-  std::string Table(const char* columns) {
-    static int counter = 0;
-    const std::string name = "ob_" + std::to_string(getpid()) + "_" + std::to_string(++counter);
-    Run("CREATE TABLE " + name + " (" + columns + ")");
-    return name;
-  }
-
-  void Run(const std::string& sql) {
-    CShareDatabase db(home_.Defs());
-    db.Connect();
-    int16_t n = 0;
-    db.ExecuteSql(sql, n);
-  }
 
   static COrderInfo Order(const std::string& name, const std::string& table,
                           std::vector<std::string> columns) {
@@ -144,8 +119,6 @@ class OrderBuildTest : public ::testing::TestWithParam<Source> {
     ADD_FAILURE() << "no column " << column;
     return {};
   }
-
-  test::SortHome home_;
 };
 
 INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTest,

@@ -4,36 +4,17 @@
 // by QM_BENCH_TEXT), one value per stanza.
 #include <benchmark/benchmark.h>
 
-#include <cstdio>
-#include <cstdlib>
-#include <fstream>
-#include <sstream>
 #include <string>
 #include <vector>
 
+#include "package_stanzas.h"
 #include "text/language.h"
 #include "text/word_pipeline.h"
 
 namespace {
 
 const std::vector<std::string>& Values() {
-  static const std::vector<std::string> values = [] {
-    const char* named = std::getenv("QM_BENCH_TEXT");
-    const std::string path = named != nullptr ? named : "/var/lib/dpkg/status";
-    std::ifstream in(path, std::ios::binary);
-    std::stringstream all;
-    all << in.rdbuf();
-    const std::string text = all.str();
-    std::vector<std::string> out;
-    for (std::size_t pos = 0; pos < text.size();) {
-      std::size_t end = text.find("\n\n", pos);
-      if (end == std::string::npos) end = text.size();
-      if (end > pos) out.push_back(text.substr(pos, end - pos));
-      pos = end + 2;
-    }
-    if (out.empty()) std::fprintf(stderr, "word_pipeline_bench: no text in %s\n", path.c_str());
-    return out;
-  }();
+  static const std::vector<std::string> values = bench::PackageStanzas("word_pipeline_bench");
   return values;
 }
 

@@ -3,40 +3,18 @@
 // value per stanza, read at start-up.
 #include <benchmark/benchmark.h>
 
-#include <cstdio>
-#include <cstdlib>
-#include <fstream>
-#include <sstream>
 #include <string>
 #include <vector>
 
+#include "package_stanzas.h"
 #include "platform/text_encoding.h"
 #include "text/next_word.h"
 #include "text/word_splitter.h"
 
 namespace {
 
-std::vector<std::string> LoadValues() {
-  const char* named = std::getenv("QM_BENCH_TEXT");
-  const std::string path = named != nullptr ? named : "/var/lib/dpkg/status";
-  std::ifstream in(path, std::ios::binary);
-  std::stringstream all;
-  all << in.rdbuf();
-  const std::string text = all.str();
-  std::vector<std::string> values;
-  std::size_t pos = 0;
-  while (pos < text.size()) {
-    std::size_t end = text.find("\n\n", pos);
-    if (end == std::string::npos) end = text.size();
-    if (end > pos) values.push_back(text.substr(pos, end - pos));
-    pos = end + 2;
-  }
-  if (values.empty()) std::fprintf(stderr, "word_split_bench: no text in %s\n", path.c_str());
-  return values;
-}
-
 const std::vector<std::string>& Utf8Values() {
-  static const std::vector<std::string> values = LoadValues();
+  static const std::vector<std::string> values = bench::PackageStanzas("word_split_bench");
   return values;
 }
 

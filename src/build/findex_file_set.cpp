@@ -1,11 +1,9 @@
 #include "build/findex_file_set.h"
 
-#include <mutex>
 #include <optional>
-#include <utility>
-#include <vector>
 
 #include "build/deleted_keys.h"
+#include "build/file_swap.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -13,8 +11,6 @@
 #include "shared/file_operations.h"
 #include "shared/global_defs.h"
 #include "shared/plain_name.h"
-#include "shared/trace.h"
-#include "shared/win_file.h"
 
 namespace qm::findex {
 
@@ -22,50 +18,6 @@ namespace {
 
 constexpr const char* kRenameMethod = "RenameIndex";
 constexpr const char* kErrorTag = "PILIB_ERROR.PiFindex.RenameIndex";
-constexpr int kExclusiveAttempts = 3;
-
-std::mutex g_hook_mutex;
-std::function<bool(const std::string&)> g_rename_hook;
-
-void Rename(const std::string& from, const std::string& to) {
-  {
-    std::lock_guard lock(g_hook_mutex);
-    if (g_rename_hook && g_rename_hook(to)) {
-      throw CWinFileException::Text("Error renaming file: %s to %s", "RemoveFile", nullptr, from,
-                                    to);
-    }
-  }
-  WinFile::RemoveFile(from, to);
-}
-
-// The exclusive lock, tried again after a time-out: a search may hold its
-// reader unit for a while, and the finished build is worth the wait.
-void LockExclusively(CLockManager& lock, std::string_view name) {
-  for (int attempt = 1;; ++attempt) {
-    try {
-      lock.LockExclusive();
-      return;
-    } catch (const CException& e) {
-      Trace(true, kErrorTag, "No exclusive access to findex %s (attempt %i of %i)", name, attempt,
-            kExclusiveAttempts);
-      if (attempt == kExclusiveAttempts) {
-        throw CPiFIndexException::Text(
-            "Could not get exclusive access to findex %s to put the new build in place",
-            kRenameMethod, &e, name);
-      }
-    }
-  }
-}
-
-// Deletes what must go once the new pair is in place; a failure is traced,
-// since the findex itself is already whole.
-void DropLeftover(const std::string& path) {
-  try {
-    DropFile(path);
-  } catch (const CException& e) {
-    Trace(true, kErrorTag, "Could not delete %s: %s", path, e.GetFullTextUtf8(kLevelGeneral));
-  }
-}
 
 void DropAddOns(const CGlobalDefs& defs, std::string_view name) {
   for (int32_t n = 1;; ++n) {
@@ -108,47 +60,31 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
   const std::string group = defs.GetGroup();
   // Searches lock the findex they open, and read its add-ons under that lock.
   CLockManager owner_lock(group, OwnerName(name), kLockFindex);
-  LockExclusively(owner_lock, OwnerName(name));
+  file_swap::LockExclusively<CPiFIndexException>(owner_lock, "findex", OwnerName(name),
+                                                 kRenameMethod, kErrorTag);
   std::optional<CLockManager> add_on_lock;
   if (IsAddOnName(name)) {
     add_on_lock.emplace(group, ToUpper(name), kLockFindex);
-    LockExclusively(*add_on_lock, ToUpper(name));
+    file_swap::LockExclusively<CPiFIndexException>(*add_on_lock, "findex", ToUpper(name),
+                                                   kRenameMethod, kErrorTag);
   }
 
-  const std::string backup_sdx = temp_sdx + ".old";
-  const std::string backup_fst = temp_fst + ".old";
-  std::vector<std::pair<std::string, std::string>> done;  // renames to undo on failure
+  // Both old files go aside before either new one comes in.
+  file_swap::Renames renames(kErrorTag);
   std::string failing = target.sdx;
   try {
-    if (platform::FileExists(target.sdx)) {
-      Rename(target.sdx, backup_sdx);
-      done.emplace_back(target.sdx, backup_sdx);
-    }
+    renames.SetAside(target.sdx, temp_sdx + ".old");
     failing = target.fst;
-    if (platform::FileExists(target.fst)) {
-      Rename(target.fst, backup_fst);
-      done.emplace_back(target.fst, backup_fst);
-    }
+    renames.SetAside(target.fst, temp_fst + ".old");
     failing = target.sdx;
-    Rename(temp_sdx, target.sdx);
-    done.emplace_back(temp_sdx, target.sdx);
+    renames.Move(temp_sdx, target.sdx);
     failing = target.fst;
-    Rename(temp_fst, target.fst);
-    done.emplace_back(temp_fst, target.fst);
+    renames.Move(temp_fst, target.fst);
   } catch (const CException& e) {
-    for (auto it = done.rbegin(); it != done.rend(); ++it) {
-      try {
-        Rename(it->second, it->first);
-      } catch (const CException& undo) {
-        Trace(true, kErrorTag, "Could not move %s back to %s: %s", it->second, it->first,
-              undo.GetFullTextUtf8(kLevelGeneral));
-      }
-    }
+    renames.Undo();
     throw CPiFIndexException::Text("Error renaming index file %S", kRenameMethod, &e, failing);
   }
-
-  DropLeftover(backup_sdx);
-  DropLeftover(backup_fst);
+  renames.DropBackups();
   if (rebuild) {
     // The new findex holds every row: add-ons and deleted keys of the old
     // one no longer apply.
@@ -165,11 +101,6 @@ void DropFiles(const CGlobalDefs& defs, std::string_view name) {
   DropAddOns(defs, name);
   DropFile(paths.fst);
   DropFile(paths.sdx);
-}
-
-void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook) {
-  std::lock_guard lock(g_hook_mutex);
-  g_rename_hook = std::move(hook);
 }
 
 }  // namespace qm::findex

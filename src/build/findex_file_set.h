@@ -9,7 +9,6 @@
 #pragma once
 
 #include <cstdint>
-#include <functional>
 #include <string>
 #include <string_view>
 
@@ -57,11 +56,6 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
 // and name's pair. REQUIRES: the caller holds the exclusive kind 2 and kind 1
 // locks of the findex.
 void DropFiles(const CGlobalDefs& defs, std::string_view name);
-
-// Tests: hook runs before every rename onto a target; when it returns true
-// the rename fails as if the file system refused it. An empty function
-// removes the hook.
-void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook);
 
 }  // namespace findex
 }  // namespace qm

@@ -1,10 +1,10 @@
 #include "build/order_file_set.h"
 
 #include <cerrno>
-#include <mutex>
 #include <set>
 #include <utility>
 
+#include "build/file_swap.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
 #include "platform/text_encoding.h"
@@ -14,8 +14,6 @@
 #include "shared/global_defs.h"
 #include "shared/plain_name.h"
 #include "shared/temp_names.h"
-#include "shared/trace.h"
-#include "shared/win_file.h"
 
 namespace qm::order_files {
 
@@ -27,11 +25,7 @@ constexpr int32_t kTempCaller = 6;
 // The generator makes names unique between builds: only files left behind
 // by a crash can be in the way of one.
 constexpr int kTempNameAttempts = 100;
-constexpr int kExclusiveAttempts = 3;
 constexpr int32_t kTextOrder = 2;
-
-std::mutex g_hook_mutex;
-std::function<bool(const std::string&)> g_rename_hook;
 
 std::string OrderFolder(const CGlobalDefs& defs) {
   return defs.GetFullDataPath(FolderKind::Orders);
@@ -40,47 +34,6 @@ std::string OrderFolder(const CGlobalDefs& defs) {
 // NAME_COLUMN: the column file's name without its extension.
 std::string ColumnFileStem(std::string_view name, std::string_view column) {
   return ToUpper(name) + "_" + ToUpper(column);
-}
-
-void Rename(const std::string& from, const std::string& to) {
-  bool refuse = false;
-  {
-    std::lock_guard lock(g_hook_mutex);
-    refuse = g_rename_hook && g_rename_hook(to);
-  }
-  if (refuse) {
-    throw CWinFileException::Text("Error renaming file: %s to %s", "RemoveFile", nullptr, from, to);
-  }
-  WinFile::RemoveFile(from, to);
-}
-
-// A file that must go but whose loss of the race is no failure of the
-// operation: traced, never raised.
-void DropQuietly(const std::string& path) {
-  try {
-    DropFile(path);
-  } catch (const CException& e) {
-    Trace(true, kErrorTag, "Could not delete %s: %s", path, e.GetFullTextUtf8(kLevelGeneral));
-  }
-}
-
-// The exclusive lock, tried again after a time-out: a search may hold its
-// reader unit for a while, and the finished build is worth the wait.
-void LockExclusively(CLockManager& lock, std::string_view name) {
-  for (int attempt = 1;; ++attempt) {
-    try {
-      lock.LockExclusive();
-      return;
-    } catch (const CException& e) {
-      Trace(true, kErrorTag, "No exclusive access to order %s (attempt %i of %i)", name, attempt,
-            kExclusiveAttempts);
-      if (attempt == kExclusiveAttempts) {
-        throw CPiOrderException::Text(
-            "Could not get exclusive access to order %s to put the new build in place",
-            kRenameMethod, &e, name);
-      }
-    }
-  }
 }
 
 }  // namespace
@@ -196,34 +149,22 @@ void BuildFiles::MoveIntoPlace(const CGlobalDefs& defs, std::string_view name,
   moves.emplace_back(sri_, target.sri);
 
   CLockManager lock(defs.GetGroup(), name, kLockOrder);
-  LockExclusively(lock, ToUpper(name));
-  std::vector<std::pair<std::string, std::string>> done;  // renames to undo on failure
-  std::vector<std::string> backups;
+  file_swap::LockExclusively<CPiOrderException>(lock, "order", ToUpper(name), kRenameMethod,
+                                                kErrorTag);
+  // Each old file goes aside just before its new one comes in.
+  file_swap::Renames renames(kErrorTag);
   for (const auto& [from, to] : moves) {
     try {
-      if (platform::FileExists(to)) {
-        const std::string backup = from + ".old";
-        Rename(to, backup);
-        done.emplace_back(to, backup);
-        backups.push_back(backup);
-      }
-      Rename(from, to);
-      done.emplace_back(from, to);
+      renames.SetAside(to, from + ".old");
+      renames.Move(from, to);
     } catch (const CException& e) {
-      for (auto it = done.rbegin(); it != done.rend(); ++it) {
-        try {
-          Rename(it->second, it->first);
-        } catch (const CException& undo) {
-          Trace(true, kErrorTag, "Could not move %s back to %s: %s", it->second, it->first,
-                undo.GetFullTextUtf8(kLevelGeneral));
-        }
-      }
+      renames.Undo();
       throw CPiOrderException::Text("Error renaming %s to %s", kRenameMethod, &e, from, to);
     }
   }
   moved_ = true;
-  for (const std::string& backup : backups) DropQuietly(backup);
-  for (const std::string& path : obsolete) DropQuietly(path);
+  renames.DropBackups();
+  for (const std::string& path : obsolete) file_swap::DropQuietly(path, kErrorTag);
 }
 
 void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo& info) {
@@ -234,11 +175,6 @@ void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo&
     for (const OrderColumn& column : info.Columns)
       DropFile(ColumnFilePath(defs, name, column.Name));
   }
-}
-
-void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook) {
-  std::lock_guard lock(g_hook_mutex);
-  g_rename_hook = std::move(hook);
 }
 
 }  // namespace qm::order_files

@@ -11,7 +11,6 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -88,11 +87,6 @@ class BuildFiles {
 // reader from then on), NAME.srt, then the column files of a type 2 info.
 // REQUIRES: the caller holds the exclusive kind 3 lock of the order.
 void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo& info);
-
-// Tests: the hook runs before every rename onto a target; when it returns
-// true the rename fails as if the file system refused it. An empty function
-// removes the hook.
-void SetRenameHookForTesting(std::function<bool(const std::string& target)> hook);
 
 }  // namespace order_files
 }  // namespace qm

@@ -3,8 +3,8 @@
 #include <sqlext.h>
 
 #include <algorithm>
-#include <cmath>
 
+#include "build/row_keys.h"
 #include "build/row_selection.h"
 #include "platform/local_time.h"
 #include "shared/exception_family.h"
@@ -64,20 +64,8 @@ OrderSource::OrderSource(CGlobalDefs& defs, const COrderInfo& definition, const 
   database_->Connect();
 
   const RowSelection selection = SelectionOf(definition);
-  const std::vector<std::string> statements = selection.Statements();
   start_time_ = SystemTimeToSQLTime(platform::CurrentLocalTime());
-  for (std::size_t i = 0; i < statements.size(); ++i) {
-    Trace(defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData", "Executing SQL. SQL: %s",
-          statements[i]);
-    try {
-      int16_t columns = 0;
-      database_->ExecuteSql(statements[i], columns);
-      break;
-    } catch (const CShareDatabaseException&) {
-      // The date literal forms differ between data sources: try the next one.
-      if (i + 1 == statements.size()) throw;
-    }
-  }
+  selection.Execute(*database_, defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData");
 
   CShareDatabase& db = *database_;
   auto require = [&](const std::string& name) {
@@ -128,16 +116,10 @@ std::vector<OrderColumnLayout> OrderSource::Layouts(bool ranks) const {
 int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, const char* method) {
   CShareDatabase& db = *database_;
   const Plan& plan = *plan_;
-  auto row_error = [&](const char* text) {
-    return CPiOrderSortException::Text(text, method, nullptr);
-  };
   db.AllocateCache();
   std::vector<CValue> values(plan.columns.size());
   std::vector<const CValue*> present(plan.columns.size());
-  CValue key_value;
-  CValue date_value;
-  CValue max_date(VALUE_TYPE::DateTime);
-  max_date.SetDateTime(max_date_key_);
+  RowKeys keys(plan.key_index, plan.key_type, plan.date_key_index, sort_max_, max_date_key_);
   int64_t rows = 0;
 
   defs_.SetProgress(5);
@@ -151,40 +133,7 @@ int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, co
             warning.GetCurrentEntry().text);
       break;
     }
-    // The key: an integer, or a double that holds a whole number.
-    int32_t key = 0;
-    int result = CShareDatabase::kValueRead;
-    try {
-      result = db.GetColumnValueFromCache(
-          plan.key_index,
-          plan.key_type == VALUE_TYPE::Double ? VALUE_TYPE::Double : VALUE_TYPE::Integer,
-          key_value);
-    } catch (const CShareDatabaseException&) {
-      throw row_error("Unique key is not numeric");
-    }
-    if (result == CShareDatabase::kValueNull)
-      throw row_error("Unique key column contains NULL values");
-    if (plan.key_type == VALUE_TYPE::Double) {
-      const double d = key_value.GetDouble();
-      if (!std::isfinite(d) || d != std::trunc(d) || !DoubleToInteger32(d, key)) {
-        throw row_error("Unique key is not numeric");
-      }
-    } else {
-      key = key_value.GetInteger();
-    }
-    sort_max_ = std::max(sort_max_, key);
-
-    if (plan.date_key_index != 0) {
-      if (db.MapColumnType(plan.date_key_index) != VALUE_TYPE::DateTime) {
-        throw row_error("DateTime key is not a datetime column");
-      }
-      // A row without a date/time key value leaves the highest one as it is.
-      if (db.GetColumnValueFromCache(plan.date_key_index, VALUE_TYPE::DateTime, date_value) ==
-              CShareDatabase::kValueRead &&
-          date_value.Compare(max_date) > 0) {
-        max_date.SetDateTime(date_value.GetDateTime());
-      }
-    }
+    const int32_t key = keys.Read<CPiOrderSortException>(db, method);
 
     for (std::size_t i = 0; i < plan.columns.size(); ++i) {
       const Plan::Column& c = plan.columns[i];
@@ -202,7 +151,8 @@ int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, co
       Trace(defs_.TraceLevel1(), trace_tag, "------ Reading row %i\n", rows);
     if (db.MoveNext() != CShareDatabase::kRowFetched) break;
   }
-  max_date_key_ = max_date.GetDateTime();
+  sort_max_ = keys.SortMax();
+  max_date_key_ = keys.MaxDateTimeKey();
   Trace(defs_.TraceLevel1(), trace_tag, "------ %i nulls\n", nulls_);
   return rows;
 }

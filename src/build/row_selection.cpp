@@ -3,8 +3,11 @@
 #include <algorithm>
 
 #include "platform/text_encoding.h"
+#include "shared/exception_family.h"
 #include "shared/index_header.h"
 #include "shared/sql_time.h"
+#include "shared/trace.h"
+#include "sources/share_database.h"
 
 namespace qm {
 
@@ -59,6 +62,22 @@ std::vector<std::string> RowSelection::Statements() const {
     return {sql + std::to_string(lower) + " AND " + KeyColumn + "<" + std::to_string(upper)};
   }
   return {sql + std::to_string(lower)};
+}
+
+void RowSelection::Execute(CShareDatabase& database, bool trace,
+                           std::string_view trace_tag) const {
+  const std::vector<std::string> statements = Statements();
+  for (std::size_t i = 0; i < statements.size(); ++i) {
+    Trace(trace, trace_tag, "Executing SQL. SQL: %s", statements[i]);
+    try {
+      int16_t columns = 0;
+      database.ExecuteSql(statements[i], columns);
+      return;
+    } catch (const CShareDatabaseException&) {
+      // The date literal forms differ between data sources: try the next one.
+      if (i + 1 == statements.size()) throw;
+    }
+  }
 }
 
 }  // namespace qm

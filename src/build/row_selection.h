@@ -6,12 +6,14 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "shared/value.h"
 
 namespace qm {
 
+class CShareDatabase;
 struct CIndexHeader;
 
 struct RowSelection {
@@ -50,6 +52,10 @@ struct RowSelection {
   // failed: one statement, or for the date/time update key the quoted literal
   // form and then the #...# form.
   std::vector<std::string> Statements() const;
+
+  // Runs the statements on database in turn until one is taken, each traced
+  // under trace_tag when trace is on; raises the last one's failure.
+  void Execute(CShareDatabase& database, bool trace, std::string_view trace_tag) const;
 };
 
 }  // namespace qm

@@ -12,6 +12,7 @@
 #include "build/document_column.h"
 #include "build/entry_sort.h"
 #include "build/findex_type.h"
+#include "build/row_keys.h"
 #include "build/row_selection.h"
 #include "build/sort_entry.h"
 #include "build/sort_stream.h"
@@ -20,7 +21,6 @@
 #include "shared/exception_family.h"
 #include "shared/sql_time.h"
 #include "shared/trace.h"
-#include "sources/column_conversion.h"
 #include "sources/share_database.h"
 #include "text/word_pipeline.h"
 
@@ -30,6 +30,7 @@ namespace {
 
 constexpr const char* kSortTag = "PILIB.PiSort.SortFindexTable";
 constexpr const char* kRowsTag = "PILIB.PiSort.WriteFindexRows";
+constexpr const char* kRowsMethod = "WriteFindexRows";
 constexpr int32_t kNoRowsSelected = 47;
 constexpr int64_t kRowTraceStep = 100000;
 
@@ -52,8 +53,7 @@ struct IndexedColumn {
 int RequireColumn(const CShareDatabase& database, const std::string& name) {
   const int index = database.GetColumnIndex(name);
   if (index == 0) {
-    throw CPiSortException::Text("Column name %S does not exist", "WriteFindexRows", nullptr,
-                                 name);
+    throw CPiSortException::Text("Column name %S does not exist", kRowsMethod, nullptr, name);
   }
   return index;
 }
@@ -132,55 +132,15 @@ class EntryWriter {
   int64_t entries_ = 0;
 };
 
-[[noreturn]] void RaiseRowError(const char* text) {
-  throw CPiSortException::Text(text, "WriteFindexRows", nullptr);
-}
-
-// The key of the current row: an integer, or one of the two row errors.
-int32_t ReadKey(CShareDatabase& database, const RowPlan& plan, CValue& value) {
-  int32_t key = 0;
-  if (plan.key_type == VALUE_TYPE::Double) {
-    // A double converts by truncation; a key must be a whole number as it is.
-    if (database.GetColumnValueFromCache(plan.key_index, VALUE_TYPE::Double, value) ==
-        CShareDatabase::kValueNull) {
-      RaiseRowError("Unique key column contains NULL values");
-    }
-    const double d = value.GetDouble();
-    if (!std::isfinite(d) || d != std::trunc(d) || !DoubleToInteger32(d, key)) {
-      RaiseRowError("Unique key is not numeric");
-    }
-    return key;
-  }
-  int result = CShareDatabase::kValueRead;
-  try {
-    result = database.GetColumnValueFromCache(plan.key_index, VALUE_TYPE::Integer, value);
-  } catch (const CShareDatabaseException&) {
-    RaiseRowError("Unique key is not numeric");
-  }
-  if (result == CShareDatabase::kValueNull) RaiseRowError("Unique key column contains NULL values");
-  return value.GetInteger();
-}
-
 }  // namespace
 
 CPiSort::CPiSort(CGlobalDefs& defs) : defs_(defs) {}
 
 void CPiSort::ExecuteSelect(CShareDatabase& database, CIndexHeader& definition) {
-  const std::vector<std::string> statements = RowSelection::FromHeader(definition).Statements();
   const DateTimeValue now = SystemTimeToSQLTime(platform::CurrentLocalTime());
   definition.BuildTime = now;
   definition.LastUpdateTime = now;
-  for (std::size_t i = 0; i < statements.size(); ++i) {
-    Trace(defs_.TraceLevel1(), kSortTag, "Executing SQL. SQL: %s", statements[i]);
-    try {
-      int16_t columns = 0;
-      database.ExecuteSql(statements[i], columns);
-      return;
-    } catch (const CShareDatabaseException&) {
-      // The date literal forms differ between data sources: try the next one.
-      if (i + 1 == statements.size()) throw;
-    }
-  }
+  RowSelection::FromHeader(definition).Execute(database, defs_.TraceLevel1(), kSortTag);
 }
 
 int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHeader& definition) {
@@ -197,15 +157,12 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
   if (IsText(type)) pipeline.emplace(defs_, WordPipelineOptions::FromHeader(definition));
   DocumentTexts documents(defs_);
 
-  CValue key_value;
+  RowKeys keys(plan.key_index, plan.key_type, plan.date_key_index, definition.SortMax,
+               definition.MaxDateTimeKey);
   CValue value;
   std::string document_text;
   int64_t rows = 0;
   int64_t nulls = 0;
-  int32_t sort_max = definition.SortMax;
-  DateTimeValue max_date_key = definition.MaxDateTimeKey;
-  CValue max_date(VALUE_TYPE::DateTime);
-  max_date.SetDateTime(max_date_key);
 
   auto write_words = [&](const auto& text, int32_t& position) {
     pipeline->WrittenWords(text, position, [&](const SplitWord& word) {
@@ -226,21 +183,7 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
             warning.GetCurrentEntry().text);
       break;
     }
-    const int32_t key = ReadKey(database, plan, key_value);
-    sort_max = std::max(sort_max, key);
-    writer.SetKey(key);
-
-    if (plan.date_key_index != 0) {
-      if (database.MapColumnType(plan.date_key_index) != VALUE_TYPE::DateTime) {
-        RaiseRowError("DateTime key is not a datetime column");
-      }
-      // A row without a date/time key value leaves the highest one as it is.
-      if (database.GetColumnValueFromCache(plan.date_key_index, VALUE_TYPE::DateTime, value) ==
-              CShareDatabase::kValueRead &&
-          value.Compare(max_date) > 0) {
-        max_date.SetDateTime(value.GetDateTime());
-      }
-    }
+    writer.SetKey(keys.Read<CPiSortException>(database, kRowsMethod));
 
     int32_t position = 0;
     for (std::size_t i = 0; i < plan.columns.size(); ++i) {
@@ -295,8 +238,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
   writer.Finish();
   Trace(defs_.TraceLevel1(), kRowsTag, "End Status. Row Count %i, Word Count: %i, Null Count: %i",
         rows, writer.Entries(), nulls);
-  definition.SortMax = sort_max;
-  definition.MaxDateTimeKey = max_date.GetDateTime();
+  definition.SortMax = keys.SortMax();
+  definition.MaxDateTimeKey = keys.MaxDateTimeKey();
   definition.KeyCount =
       static_cast<int32_t>(std::min<int64_t>(rows, std::numeric_limits<int32_t>::max()));
   return rows;

@@ -24,16 +24,6 @@ int CompareWide(const uint8_t* units, std::size_t n, std::u16string_view other) 
   return Order(n, other.size());
 }
 
-int CompareDates(const DateTimeValue& a, const DateTimeValue& b) {
-  if (a.year != b.year) return Order(a.year, b.year);
-  if (a.month != b.month) return Order(a.month, b.month);
-  if (a.day != b.day) return Order(a.day, b.day);
-  if (a.hour != b.hour) return Order(a.hour, b.hour);
-  if (a.minute != b.minute) return Order(a.minute, b.minute);
-  if (a.second != b.second) return Order(a.second, b.second);
-  return Order(a.fraction, b.fraction);
-}
-
 }  // namespace
 
 int BlockValue::Compare(const CValue& other) const {

@@ -233,17 +233,8 @@ int CValue::Compare(const CValue& other) const {
     case VALUE_TYPE::Double:
       if (std::isnan(double_) || std::isnan(other.double_)) return kNotComparable;
       return Order(double_, other.double_);
-    case VALUE_TYPE::DateTime: {
-      const auto& a = date_;
-      const auto& b = other.date_;
-      if (a.year != b.year) return Order(a.year, b.year);
-      if (a.month != b.month) return Order(a.month, b.month);
-      if (a.day != b.day) return Order(a.day, b.day);
-      if (a.hour != b.hour) return Order(a.hour, b.hour);
-      if (a.minute != b.minute) return Order(a.minute, b.minute);
-      if (a.second != b.second) return Order(a.second, b.second);
-      return Order(a.fraction, b.fraction);
-    }
+    case VALUE_TYPE::DateTime:
+      return CompareDates(date_, other.date_);
   }
   return kNotComparable;
 }

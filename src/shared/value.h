@@ -1,6 +1,7 @@
 // CValue: one typed column value; CColumnValues: one table row of them.
 #pragma once
 
+#include <compare>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -27,7 +28,15 @@ struct DateTimeValue {
   uint32_t fraction = 0;
 
   bool operator==(const DateTimeValue&) const = default;
+  // Field by field, from the year down to the fraction.
+  auto operator<=>(const DateTimeValue&) const = default;
 };
+
+// -1, 0 or 1, as a date/time comes before, with or after another.
+inline int CompareDates(const DateTimeValue& a, const DateTimeValue& b) {
+  const auto order = a <=> b;
+  return order < 0 ? -1 : (order > 0 ? 1 : 0);
+}
 
 // Compare's result when two values cannot be ordered.
 inline constexpr int kNotComparable = 10;

@@ -12,6 +12,7 @@
 #include <string>
 #include <string_view>
 
+#include "quillmere/api_enums.h"
 #include "text/character_table.h"
 #include "text/character_translation.h"
 #include "text/phonet.h"
@@ -21,21 +22,6 @@
 namespace qm {
 
 class CGlobalDefs;
-
-enum lngLanguageEnum : int32_t {
-  lngDanish = 1,
-  lngEnglish = 2,
-  lngFrench = 3,
-  lngSpanish = 4,
-  lngPortuguese = 5,
-  lngItalian = 6,
-  lngGerman = 7,
-  lngDutch = 8,
-  lngSwedish = 9,
-  lngNorwegian = 10,
-  lngRussian = 11,
-  lngOther = 12,
-};
 
 inline constexpr int32_t kDefaultLanguage = lngEnglish;
 

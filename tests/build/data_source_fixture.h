@@ -6,27 +6,14 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <cstdlib>
 #include <filesystem>
 #include <string>
 #include <vector>
 
 #include "api/command_fixture.h"
+#include "test_sources.h"
 
 namespace qm::test {
-
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
-
-inline std::string SourceName(const ::testing::TestParamInfo<Source>& info) {
-  switch (info.param) {
-    case Source::SQLite:
-      return "SQLite";
-    case Source::PostgresAnsi:
-      return "PostgresAnsi";
-    default:
-      return "PostgresUnicode";
-  }
-}
 
 class DataSourceTest : public CommandFixture, public ::testing::WithParamInterface<Source> {
  protected:
@@ -38,13 +25,10 @@ class DataSourceTest : public CommandFixture, public ::testing::WithParamInterfa
     if (GetParam() == Source::SQLite) {
       connection_ = SqliteConnection();
     } else {
-      const char* variable =
-          GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-      const char* value = std::getenv(variable);
-      if (value == nullptr || *value == '\0') {
-        GTEST_SKIP() << variable << " is not set: scripts/test starts PostgreSQL";
+      connection_ = PostgresConnection(GetParam());
+      if (connection_.empty()) {
+        GTEST_SKIP() << PostgresVariable(GetParam()) << " is not set: scripts/test starts PostgreSQL";
       }
-      connection_ = value;
     }
     ASSERT_EQ(command_->SetDBConnectionStringEx(T(connection_), T("Books Source")), S_OK)
         << LastError();

@@ -12,6 +12,7 @@
 #include <thread>
 #include <vector>
 
+#include "build/file_swap.h"
 #include "build/findex_file_set.h"
 #include "build/findex_files_writer.h"
 #include "build/findex_writer.h"
@@ -50,7 +51,7 @@ class FindexBuildTest : public ::testing::Test {
   }
   ~FindexBuildTest() override {
     SetFindexLimitsForTesting({});
-    findex::SetRenameHookForTesting({});
+    file_swap::SetRenameHookForTesting({});
     CLockManager::ScaleTimeoutsForTesting(1.0);
   }
 
@@ -230,14 +231,14 @@ TEST_F(FindexBuildTest, FailedBuildsLeaveTheFindexAsItWasAndNoTemporaryFile) {
        "out of order"},
       {"rename",
        [&] {
-         findex::SetRenameHookForTesting([&](const std::string& target) {
+         file_swap::SetRenameHookForTesting([&](const std::string& target) {
            return target.ends_with("/BOOKS.fst") && ++renames == 1;
          });
        },
        Words("x", 30), "Error renaming index file"},
       {"readers",
        [&] {
-         findex::SetRenameHookForTesting({});
+         file_swap::SetRenameHookForTesting({});
          reader.LockReader();
          CLockManager::ScaleTimeoutsForTesting(0.001);
        },
@@ -316,7 +317,7 @@ TEST_F(FindexBuildTest, ReadersUnderTheFindexLockSeeTheWholeOldOrNewFindex) {
   Build("Books", small, true);
   // Slow renames give a reader that ignored the lock every chance to meet a
   // findex half moved.
-  findex::SetRenameHookForTesting([](const std::string&) {
+  file_swap::SetRenameHookForTesting([](const std::string&) {
     std::this_thread::sleep_for(std::chrono::milliseconds(10));
     return false;
   });

@@ -12,6 +12,7 @@
 #include <functional>
 #include <map>
 
+#include "build/file_swap.h"
 #include "build/order_file_set.h"
 #include "build/pi_order.h"
 #include "locks/lock_manager.h"
@@ -20,14 +21,14 @@
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 #include "sorted_file_reader.h"
-#include "sources/share_database.h"
+#include "test_sources.h"
 
 namespace qm {
 namespace {
 
 namespace fs = std::filesystem;
 
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
+using test::Source;
 
 constexpr int32_t kNull = 2147483647;
 
@@ -41,41 +42,16 @@ int32_t Low(double v) {
 }
 int32_t High(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v) >> 32); }
 
-class OrderBuildTest : public ::testing::TestWithParam<Source> {
+class OrderBuildTest : public test::SourceRowsTest {
  protected:
+  OrderBuildTest() : SourceRowsTest("ob_") {}
+
   void SetUp() override {
-    LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini");
     fs::create_directories(Orders());
-    if (GetParam() == Source::SQLite) {
-      home_.Defs().SetConnectionString(
-          "Driver=SQLite3;Database=" + home_.Data() + "rows.db;StepAPI=1", "test");
-      return;
-    }
-    const char* name =
-        GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-    const char* connection = std::getenv(name);
-    if (connection == nullptr || *connection == '\0') {
-      GTEST_SKIP() << name << " is not set: run through scripts/test, which starts PostgreSQL";
-    }
-    home_.Defs().SetConnectionString(connection, "test");
+    SourceRowsTest::SetUp();
   }
 
-  void TearDown() override { order_files::SetRenameHookForTesting({}); }
-
-  // A table name no other test process uses at the same time.
-  std::string Table(const char* columns) {
-    static int counter = 0;
-    const std::string name = "ob_" + std::to_string(getpid()) + "_" + std::to_string(++counter);
-    Run("CREATE TABLE " + name + " (" + columns + ")");
-    return name;
-  }
-
-  void Run(const std::string& sql) {
-    CShareDatabase db(home_.Defs());
-    db.Connect();
-    int16_t n = 0;
-    db.ExecuteSql(sql, n);
-  }
+  void TearDown() override { file_swap::SetRenameHookForTesting({}); }
 
   static COrderInfo Order(const std::string& name, const std::string& table,
                           std::vector<std::string> columns) {
@@ -143,8 +119,6 @@ class OrderBuildTest : public ::testing::TestWithParam<Source> {
     ADD_FAILURE() << "no column " << column;
     return {};
   }
-
-  test::SortHome home_;
 };
 
 INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTest,
@@ -346,7 +320,7 @@ TEST_P(OrderBuildTest, FailedBuildsLeaveTheOrderAsItWasAndNoTemporaryFile) {
 
   // The move fails once, on the .srt: the files already moved go back.
   bool failed = false;
-  order_files::SetRenameHookForTesting([&failed](const std::string& target) {
+  file_swap::SetRenameHookForTesting([&failed](const std::string& target) {
     if (failed || !target.ends_with("KEPT.srt")) return false;
     return failed = true;
   });
@@ -355,7 +329,7 @@ TEST_P(OrderBuildTest, FailedBuildsLeaveTheOrderAsItWasAndNoTemporaryFile) {
   EXPECT_TRUE(renaming.starts_with("Error renaming ")) << renaming;
   EXPECT_NE(renaming.find("KEPT.srt (Module:PiOrder,Method:RenameOrder2)"), std::string::npos)
       << renaming;
-  order_files::SetRenameHookForTesting({});
+  file_swap::SetRenameHookForTesting({});
   EXPECT_EQ(Snapshot(), before);
 
   const std::string nulls = Table("id INTEGER, label VARCHAR(10), n INTEGER");

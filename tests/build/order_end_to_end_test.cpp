@@ -4,16 +4,15 @@
 // CreateOrderEx, the stored options, every information value, date/time key
 // updates and background builds.
 #include <gtest/gtest.h>
-#include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
-#include <cstdlib>
 #include <filesystem>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include "api/command_fixture.h"
+#include "data_source_fixture.h"
 #include "order_file_decoder.h"
 #include "quillmere/api_enums.h"
 
@@ -22,71 +21,14 @@ namespace {
 
 namespace fs = std::filesystem;
 
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
-
 using Entries = std::vector<test::ColumnEntry>;
 using Rows = std::vector<std::vector<int32_t>>;
 
-std::string SourceName(const ::testing::TestParamInfo<Source>& info) {
-  switch (info.param) {
-    case Source::SQLite: return "SQLite";
-    case Source::PostgresAnsi: return "PostgresAnsi";
-    default: return "PostgresUnicode";
-  }
-}
+using test::Source;
 
-class OrderEndToEndTest : public test::CommandFixture,
-                          public ::testing::WithParamInterface<Source> {
+class OrderEndToEndTest : public test::DataSourceTest {
  protected:
-  void SetUp() override {
-    CommandFixture::SetUp();
-    if (GetParam() == Source::SQLite) {
-      connection_ = SqliteConnection();
-    } else {
-      const char* variable =
-          GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-      const char* value = std::getenv(variable);
-      if (value == nullptr || *value == '\0') {
-        GTEST_SKIP() << variable << " is not set: scripts/test starts PostgreSQL";
-      }
-      connection_ = value;
-    }
-    ASSERT_EQ(command_->SetDBConnectionStringEx(T(connection_), T("Books Source")), S_OK)
-        << LastError();
-    prefix_ = "oe_" + std::to_string(getpid()) + "_";
-  }
-
-  void TearDown() override {
-    if (!connection_.empty()) {
-      for (const std::string& table : tables_) OnSource({"drop table " + table});
-    }
-    CommandFixture::TearDown();
-  }
-
-  void OnSource(const std::vector<std::string>& statements) {
-    CGlobalDefs defs = Defs();
-    defs.SetConnectionString(connection_, "test");
-    CShareDatabase database(defs);
-    database.Connect();
-    for (const auto& statement : statements) {
-      int16_t columns = 0;
-      database.ExecuteSql(statement, columns);
-    }
-    database.Disconnect();
-  }
-
-  std::string Table(const std::string& stem, const std::string& columns,
-                    const std::vector<std::string>& rows = {}) {
-    const std::string name = prefix_ + stem;
-    std::vector<std::string> statements{"create table " + name + " (" + columns + ")"};
-    for (const std::string& row : rows) {
-      statements.push_back("insert into " + name + " values (" + row + ")");
-    }
-    OnSource(statements);
-    tables_.push_back(name);
-    return name;
-  }
-
+  // The order's information value (the base class reads a findex's).
   std::string Info(const std::string& order, int32_t value) {
     EXPECT_EQ(command_->SetCurrentObjectName(T(order)), S_OK);
     BSTR text = u"untouched";
@@ -118,16 +60,12 @@ class OrderEndToEndTest : public test::CommandFixture,
     }
     ASSERT_EQ(Progress(), 100) << "the background job did not end";
   }
-
-  std::string connection_;
-  std::string prefix_;
-  std::vector<std::string> tables_;
 };
 
 INSTANTIATE_TEST_SUITE_P(Sources, OrderEndToEndTest,
                          ::testing::Values(Source::SQLite, Source::PostgresAnsi,
                                            Source::PostgresUnicode),
-                         SourceName);
+                         test::SourceName);
 
 TEST_P(OrderEndToEndTest, CreateOrderWithTheCurrentOptionsAndEveryInformationValue) {
   const std::string books = Table("books", "id integer, title varchar(100), year integer",

@@ -16,49 +16,21 @@
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 #include "sorted_file_reader.h"
-#include "sources/share_database.h"
+#include "test_sources.h"
 
 namespace qm {
 namespace {
 
 namespace fs = std::filesystem;
 
-enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
+using test::Source;
 
 // (word or value as text, key, weight or 0, position or 0)
 using Entry = std::tuple<std::string, int32_t, int32_t, int32_t>;
 
-class WordSortTest : public ::testing::TestWithParam<Source> {
+class WordSortTest : public test::SourceRowsTest {
  protected:
-  void SetUp() override {
-    LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini");
-    if (GetParam() == Source::SQLite) {
-      home_.Defs().SetConnectionString(
-          "Driver=SQLite3;Database=" + home_.Data() + "rows.db;StepAPI=1", "test");
-      return;
-    }
-    const char* name = GetParam() == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
-    const char* connection = std::getenv(name);
-    if (connection == nullptr || *connection == '\0') {
-      GTEST_SKIP() << name << " is not set: run through scripts/test, which starts PostgreSQL";
-    }
-    home_.Defs().SetConnectionString(connection, "test");
-  }
-
-  // A table name no other test process uses at the same time.
-  std::string Table(const char* columns) {
-    static int counter = 0;
-    const std::string name = "ws_" + std::to_string(getpid()) + "_" + std::to_string(++counter);
-    Run("CREATE TABLE " + name + " (" + columns + ")");
-    return name;
-  }
-
-  void Run(const std::string& sql) {
-    CShareDatabase db(home_.Defs());
-    db.Connect();
-    int16_t n = 0;
-    db.ExecuteSql(sql, n);
-  }
+  WordSortTest() : SourceRowsTest("ws_") {}
 
   static CIndexHeader Findex(const std::string& table, ColumnMap columns, int32_t flags) {
     CIndexHeader d;
@@ -121,8 +93,6 @@ class WordSortTest : public ::testing::TestWithParam<Source> {
     }
     return {"no error", 0};
   }
-
-  test::SortHome home_;
 };
 
 INSTANTIATE_TEST_SUITE_P(Sources, WordSortTest,

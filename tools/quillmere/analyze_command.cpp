@@ -87,7 +87,7 @@ bool ParseOptions(const std::vector<std::string>& args, AnalyzeOptions& o, std::
     else if (a == "--phonetic") o.phonetic = true;
     else if (a == "--html") o.html = true;
     else if (a == "--no-default-separators") o.default_separators = false;
-    else if (a == "--help" || a == "-h") o.help = true;
+    else if (IsHelpFlag(a)) o.help = true;
     else if (a == "--separators" || a == "--language") {
       if (i + 1 >= args.size()) {
         error = a + " needs a value";

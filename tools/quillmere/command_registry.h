@@ -3,6 +3,7 @@
 
 #include <functional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace qm::cli {
@@ -21,6 +22,9 @@ struct GlobalOptions {
 inline constexpr int kExitOk = 0;
 inline constexpr int kExitError = 1;
 inline constexpr int kExitUsage = 2;
+
+// "--help" or "-h".
+inline bool IsHelpFlag(std::string_view arg) { return arg == "--help" || arg == "-h"; }
 
 struct Command {
   std::string name;

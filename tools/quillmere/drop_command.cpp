@@ -14,7 +14,7 @@ constexpr const char* kUsage = "drop findex NAME | drop order NAME";
 
 int RunDrop(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("drop");
-  if (args.size() == 1 && (args[0] == "--help" || args[0] == "-h")) {
+  if (args.size() == 1 && IsHelpFlag(args[0])) {
     std::printf(
         "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
         "Drops the findex NAME of the group: its files, its add-on findexes and its\n"

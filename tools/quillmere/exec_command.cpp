@@ -68,13 +68,7 @@ int RunBackground(HostSession& session, const BSTR* statement) {
     return session.Fail();
   }
   if (failed == 0) return kExitOk;
-  std::string text = Utf16ToUtf8(message);
-  for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
-    text.erase(at, 1);
-  }
-  if (text.empty() || text.back() != '\n') text += '\n';
-  std::fprintf(stderr, "quillmere exec: %s", text.c_str());
-  return kExitError;
+  return session.Fail(Utf16ToUtf8(message));
 }
 
 int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
@@ -82,7 +76,7 @@ int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
   bool background = false;
   std::string statement;
   for (const std::string& a : args) {
-    if (statement.empty() && (a == "--help" || a == "-h")) {
+    if (statement.empty() && IsHelpFlag(a)) {
       PrintHelp();
       return kExitOk;
     }

@@ -13,7 +13,7 @@ constexpr const char* kUsage = "exists NAME";
 
 int RunExists(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("exists");
-  if (args.size() == 1 && (args[0] == "--help" || args[0] == "-h")) {
+  if (args.size() == 1 && IsHelpFlag(args[0])) {
     std::printf(
         "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
         "Prints \"yes\" when the findex NAME opens in the group (--group, default PUBLIC),\n"

@@ -1,8 +1,10 @@
 #include "host_session.h"
 
 #include <cstdio>
+#include <utility>
 
 #include "platform/text_encoding.h"
+#include "terminal_text.h"
 
 namespace qm::cli {
 
@@ -62,11 +64,11 @@ bool HostSession::Open(const GlobalOptions& options) {
 
 int HostSession::Fail() {
   ErrorInfo info;
-  std::string text = GetErrorInfo(info) ? Utf16ToUtf8(info.Description) : "unknown failure";
-  // The message chain's lines end in "\r\n"; a terminal wants "\n".
-  for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
-    text.erase(at, 1);
-  }
+  return Fail(GetErrorInfo(info) ? Utf16ToUtf8(info.Description) : "unknown failure");
+}
+
+int HostSession::Fail(std::string text) {
+  text = TerminalLines(std::move(text));
   if (text.empty() || text.back() != '\n') text += '\n';
   std::fprintf(stderr, "quillmere %s: %s", name_.c_str(), text.c_str());
   return kExitError;

@@ -29,6 +29,8 @@ class HostSession {
   // Prints the calling thread's error information to standard error and
   // returns kExitError.
   int Fail();
+  // Prints "quillmere NAME: text" to standard error and returns kExitError.
+  int Fail(std::string text);
   // Prints "quillmere NAME: message" to standard error and returns kExitUsage.
   int Usage(std::string_view message, std::string_view usage);
 

@@ -63,7 +63,7 @@ void PrintHelp() {
 
 int RunInfo(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("info");
-  if (!args.empty() && (args[0] == "--help" || args[0] == "-h")) {
+  if (!args.empty() && IsHelpFlag(args[0])) {
     PrintHelp();
     return kExitOk;
   }

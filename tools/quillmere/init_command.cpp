@@ -114,7 +114,7 @@ int RunInit(const GlobalOptions& global, const std::vector<std::string>& args) {
   std::string group = global.group.empty() ? "PUBLIC" : global.group;
   for (std::size_t i = 0; i < args.size(); ++i) {
     const std::string& a = args[i];
-    if (a == "--help" || a == "-h") {
+    if (IsHelpFlag(a)) {
       PrintHelp(stdout);
       return kExitOk;
     }

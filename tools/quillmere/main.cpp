@@ -53,7 +53,7 @@ int main(int argc, char** argv) {
                           : a == "--user"     ? &options.user
                           : a == "--password" ? &options.password
                                               : nullptr;
-    if (a == "--help" || a == "-h") {
+    if (IsHelpFlag(a)) {
       PrintHelp(stdout);
       return kExitOk;
     }

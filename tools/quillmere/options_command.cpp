@@ -202,7 +202,7 @@ std::optional<std::string> CheckValue(const Option& option, const std::string& t
 
 int RunOptions(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("options");
-  if (!args.empty() && (args[0] == "--help" || args[0] == "-h")) {
+  if (!args.empty() && IsHelpFlag(args[0])) {
     PrintHelp();
     return kExitOk;
   }

@@ -7,13 +7,17 @@
 
 namespace qm::cli {
 
-// The whole message chain, its lines ending in "\n" rather than "\r\n".
-inline std::string TerminalText(const CExceptionBase& e) {
-  std::string text = e.GetFullTextUtf8(kLevelWritten);
+// text with its "\r\n" line ends (those of a message chain) as "\n".
+inline std::string TerminalLines(std::string text) {
   for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
     text.erase(at, 1);
   }
   return text;
+}
+
+// The whole message chain, its lines ending in "\n".
+inline std::string TerminalText(const CExceptionBase& e) {
+  return TerminalLines(e.GetFullTextUtf8(kLevelWritten));
 }
 
 }  // namespace qm::cli

@@ -10,6 +10,7 @@
 #include "command_registry.h"
 #include "platform/text_encoding.h"
 #include "shared/exception.h"
+#include "terminal_text.h"
 
 namespace qm::cli {
 
@@ -105,11 +106,7 @@ int RunTranslate(const GlobalOptions&, const std::vector<std::string>& args) {
   try {
     cmd.TranslateW(Utf8ToUtf16(statement));
   } catch (CExceptionBase& e) {
-    std::string text = e.GetFullTextUtf8(100);
-    for (auto pos = text.find("\r\n"); pos != std::string::npos; pos = text.find("\r\n", pos)) {
-      text.erase(pos, 1);
-    }
-    std::fputs(text.c_str(), stderr);
+    std::fputs(TerminalText(e).c_str(), stderr);
     return kExitError;
   }
   PrintRecord(cmd, findex, order, connection);

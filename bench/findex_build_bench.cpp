@@ -6,20 +6,23 @@
 // SQLite ODBC driver; the reference is a contentless FTS5 table with positions,
 // fts5(title, body, content=''), filled from the same file.
 //
-//   findex_build_bench [--corpus FILE]... [--runs N] [--no-fts5]
+//   findex_build_bench [--corpus FILE]... [--runs N] [--no-fts5] [--phases]
 //
 // The corpus may also come from QM_BENCH_CORPUS (several files separated by
 // ':'). Without one the program says so and exits 0 (machines without the
 // corpus). Every build runs in a child process of its own, so its peak memory
-// (maximum resident set) and CPU time are its own. Phases of the findex build
-// are timed from its progress: 5 the SELECT ran, 15 the rows are read and
-// split, 20 the 8,192-entry arrays are sorted into runs, 90 the two-way merge
-// passes are done, then the writer.
+// (maximum resident set) and CPU time are its own. --phases builds the same
+// findex once more from its two halves, the word sort (CPiSort) and the
+// writer (CPiFIndex::BuildFromSorted), to time its phases: the row loop (to
+// progress 15: rows read, split and written as entries), level one (to 20:
+// the 8,192-entry arrays sorted into runs), the two-way merge passes, the
+// writer, and closing the sorted file.
 #include <sqlite3.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -33,8 +36,14 @@
 #include <thread>
 #include <vector>
 
+#include "build/findex_writer.h"
+#include "build/word_sort.h"
 #include "platform/text_encoding.h"
 #include "quillmere/api_command.h"
+#include "shared/exception.h"
+#include "shared/global_defs.h"
+#include "shared/index_header.h"
+#include "shared/mfile.h"
 
 namespace {
 
@@ -167,42 +176,28 @@ std::pair<int64_t, double> CorpusSize(const std::string& corpus) {
 
 std::string Text(const BSTR& text) { return qm::Utf16ToUtf8(text); }
 
-// One findex build through the command object, as a background job whose
-// progress is polled for the phases.
+std::string Connection(const std::string& corpus) {
+  return "Driver=SQLite3;Database=" + corpus + ";StepAPI=1;NoCreat=1;";
+}
+
+// One findex build through the command object.
 Report BuildFindex(const std::string& corpus) {
   const DataRoot root;
   APICommand command;
   const BSTR path = qm::Utf8ToUtf16(root.Path());
-  const BSTR connection = qm::Utf8ToUtf16("Driver=SQLite3;Database=" + corpus + ";StepAPI=1;NoCreat=1;");
+  const BSTR connection = qm::Utf8ToUtf16(Connection(corpus));
   const BSTR name = u"corpus";
   const BSTR statement = u"CREATE FINDEX Docs ON TABLE docs COLUMNS title,body KEY id";
-  if (command.SetDataPath(&path) != S_OK || command.SetDBConnectionStringEx(&connection, &name) != S_OK) {
+  if (command.SetDataPath(&path) != S_OK ||
+      command.SetDBConnectionStringEx(&connection, &name) != S_OK) {
     throw std::runtime_error("cannot set up the command object");
   }
-  // The phase a progress value ends, and when it was first seen.
-  const int32_t kMarks[] = {5, 15, 20, 90};
-  Clock::time_point seen[4] = {};
   const Clock::time_point start = Clock::now();
-  if (command.ExecuteEx(&statement, 0) != S_OK) throw std::runtime_error("ExecuteEx failed");
-  for (int32_t progress = 0; progress != 100;) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    if (command.GetProgress(&progress) != S_OK) throw std::runtime_error("GetProgress failed");
-    const Clock::time_point now = Clock::now();
-    for (int i = 0; i < 4; ++i) {
-      if (progress >= kMarks[i] && seen[i] == Clock::time_point{}) seen[i] = now;
-    }
+  if (command.ExecuteEx(&statement, -1) != S_OK) {
+    qm::ErrorInfo info;
+    throw std::runtime_error(qm::GetErrorInfo(info) ? Text(info.Description) : "ExecuteEx failed");
   }
   const Clock::time_point end = Clock::now();
-  int32_t failed = 0;
-  command.GetErrorNumber(&failed);
-  if (failed != 0) {
-    BSTR message;
-    command.GetErrorMsg(&message);
-    throw std::runtime_error(Text(message));
-  }
-  for (auto& t : seen) {
-    if (t == Clock::time_point{}) t = end;
-  }
   BSTR words;
   const BSTR object = u"Docs";
   command.SetCurrentObjectName(&object);
@@ -210,16 +205,62 @@ Report BuildFindex(const std::string& corpus) {
   BSTR distinct;
   command.GetFindexInfo(qm::idxDistinctWordCount, &distinct);
   return {{"total_s", Seconds(end - start)},
-          {"select_s", Seconds(seen[0] - start)},
-          {"rows_s", Seconds(seen[1] - seen[0])},
-          {"level_one_s", Seconds(seen[2] - seen[1])},
-          {"merges_s", Seconds(seen[3] - seen[2])},
-          {"writer_s", Seconds(end - seen[3])},
           {"words", std::stod(Text(words))},
           {"distinct", std::stod(Text(distinct))},
           {"index_mb", static_cast<double>(fs::file_size(root.Indexes() + "DOCS.sdx") +
                                            fs::file_size(root.Indexes() + "DOCS.fst")) /
                            1e6}};
+}
+
+// The same findex from its two halves, each timed; the row loop and level
+// one are told apart by the progress the sort reports.
+Report BuildFindexByPhases(const std::string& corpus) {
+  const DataRoot root;
+  qm::CGlobalDefs defs;
+  defs.SetDataPath(root.Path());
+  defs.SetConnectionString(Connection(corpus), "corpus");
+  qm::CIndexHeader definition;  // the default options
+  definition.IndexName = "Docs";
+  definition.TableName = "docs";
+  definition.KeyColumn = "id";
+  definition.Columns = {{"title", {}}, {"body", {}}};
+
+  std::atomic<bool> done = false;
+  Clock::time_point at15{}, at20{};
+  std::thread watch([&] {
+    while (!done) {
+      const int32_t p = defs.GetProgress();
+      if (p >= 15 && at15 == Clock::time_point{}) at15 = Clock::now();
+      if (p >= 20 && at20 == Clock::time_point{}) at20 = Clock::now();
+      std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+  });
+  Clock::time_point start, sorted_at, written_at, closed_at;
+  try {
+    start = Clock::now();
+    qm::MFile sorted;
+    qm::CPiSort(defs).SortFindexTable(definition, sorted);
+    sorted_at = Clock::now();
+    qm::CPiFIndex(defs).BuildFromSorted(definition, sorted, true);
+    written_at = Clock::now();
+    sorted.Close();
+    closed_at = Clock::now();
+  } catch (const qm::CExceptionBase& e) {
+    done = true;
+    watch.join();
+    throw std::runtime_error(e.GetFullTextUtf8(100));
+  }
+  done = true;
+  watch.join();
+  if (at15 == Clock::time_point{}) at15 = sorted_at;
+  if (at20 == Clock::time_point{}) at20 = sorted_at;
+  return {{"rows_s", Seconds(at15 - start)},
+          {"level_one_s", Seconds(at20 - at15)},
+          {"merges_s", Seconds(sorted_at - at20)},
+          {"writer_s", Seconds(written_at - sorted_at)},
+          {"close_s", Seconds(closed_at - written_at)},
+          {"total_s", Seconds(closed_at - start)},
+          {"words", static_cast<double>(definition.WordCount)}};
 }
 
 // The reference: a contentless FTS5 table with positions over the same rows.
@@ -261,6 +302,7 @@ int main(int argc, char** argv) {
   }
   int runs = 1;
   bool fts5 = true;
+  bool phases = false;
   bool from_flags = false;
   for (int i = 1; i < argc; ++i) {
     const std::string a = argv[i];
@@ -272,8 +314,12 @@ int main(int argc, char** argv) {
       runs = std::max(1, std::atoi(argv[++i]));
     } else if (a == "--no-fts5") {
       fts5 = false;
+    } else if (a == "--phases") {
+      phases = true;
     } else {
-      std::fprintf(stderr, "usage: findex_build_bench [--corpus FILE]... [--runs N] [--no-fts5]\n");
+      std::fprintf(stderr,
+                   "usage: findex_build_bench [--corpus FILE]... [--runs N] [--no-fts5] "
+                   "[--phases]\n");
       return 2;
     }
   }
@@ -296,27 +342,36 @@ int main(int argc, char** argv) {
       const double text_mb = bytes / 1e6;
       std::printf("\n%s: %lld rows, %.1f MB of text\n", corpus.c_str(), static_cast<long long>(rows),
                   text_mb);
-      std::printf("%-7s %3s %8s %7s %8s %8s %8s %7s %8s %8s %7s %7s %9s\n", "build", "run",
-                  "total s", "cpu s", "MB/s", "peak MB", "index MB", "select", "rows", "level 1",
-                  "merges", "writer", "x FTS5");
+      std::printf("%-7s %3s %8s %7s %7s %8s %9s %7s\n", "build", "run", "total s", "cpu s", "MB/s",
+                  "peak MB", "index MB", "x FTS5");
       for (int r = 1; r <= runs; ++r) {
         double reference = 0;
         if (fts5) {
           const Report f = InChild([&] { return BuildFts5(corpus); });
           reference = f.at("total_s");
-          std::printf("%-7s %3d %8.2f %7.2f %8.1f %8.1f %8.1f\n", "FTS5", r, reference,
+          std::printf("%-7s %3d %8.2f %7.2f %7.1f %8.1f %9.1f\n", "FTS5", r, reference,
                       f.at("cpu_s"), text_mb / reference, f.at("peak_mb"), f.at("index_mb"));
         }
         const Report q = InChild([&] { return BuildFindex(corpus); });
         const double total = q.at("total_s");
-        std::printf("%-7s %3d %8.2f %7.2f %8.1f %8.1f %8.1f %7.2f %8.2f %8.2f %7.2f %7.2f", "findex",
-                    r, total, q.at("cpu_s"), text_mb / total, q.at("peak_mb"), q.at("index_mb"),
-                    q.at("select_s"), q.at("rows_s"), q.at("level_one_s"), q.at("merges_s"),
-                    q.at("writer_s"));
-        if (reference > 0) std::printf(" %9.2f", total / reference);
+        std::printf("%-7s %3d %8.2f %7.2f %7.1f %8.1f %9.1f", "findex", r, total, q.at("cpu_s"),
+                    text_mb / total, q.at("peak_mb"), q.at("index_mb"));
+        if (reference > 0) std::printf(" %7.2f", total / reference);
         std::printf("\n");
         if (r == 1) {
-          std::printf("        findex: %.0f words, %.0f distinct\n", q.at("words"), q.at("distinct"));
+          std::printf("        %.0f words written, %.0f distinct\n", q.at("words"),
+                      q.at("distinct"));
+        }
+        if (phases) {
+          const Report p = InChild([&] { return BuildFindexByPhases(corpus); });
+          std::printf(
+              "phases  %3d %8.2f %7.2f  row loop %.2f, level one %.2f, merge passes %.2f, "
+              "writer %.2f, closing %.2f s\n",
+              r, p.at("total_s"), p.at("cpu_s"), p.at("rows_s"), p.at("level_one_s"),
+              p.at("merges_s"), p.at("writer_s"), p.at("close_s"));
+          if (p.at("words") != q.at("words")) {
+            throw std::runtime_error("the phase build wrote another number of words");
+          }
         }
       }
     }

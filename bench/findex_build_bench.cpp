@@ -87,6 +87,7 @@ using Report = std::map<std::string, double>;
 
 std::string Format(const Report& report) {
   std::ostringstream out;
+  out.precision(17);  // counts of millions stay whole
   for (const auto& [name, value] : report) out << name << '=' << value << '\n';
   return out.str();
 }

@@ -221,12 +221,16 @@ TEST_P(SourceTest, TextOutsideLatin1PassesWholeInStatementsNamesValuesAndMessage
   EXPECT_EQ(db.UsesWideCalls(), Wide());
   const std::string t = UniqueTable("names");
   const std::string word = "Grüße 中文 😀";
-  Run(db, "CREATE TABLE " + t + " (id INTEGER, \"Größe\" VARCHAR(40))");
-  Run(db, "INSERT INTO " + t + " VALUES (1, '" + word + "')");
-  Run(db, "INSERT INTO " + t + " VALUES (2, 'other')");
+  // Pieces of 4-byte characters (or surrogate pairs) end inside them.
+  std::string astral = "a";
+  for (int i = 0; i < 3000; ++i) astral += "😀";
+  Run(db, "CREATE TABLE " + t + " (id INTEGER, \"Größe\" VARCHAR(40), astral TEXT)");
+  Run(db, "INSERT INTO " + t + " VALUES (1, '" + word + "', '" + astral + "')");
+  Run(db, "INSERT INTO " + t + " VALUES (2, 'other', NULL)");
   // The literal must reach the data source as written to find its row.
   int16_t n = 0;
-  db.ExecuteSql("SELECT id, \"Größe\" FROM " + t + " WHERE \"Größe\" = '" + word + "'", n);
+  db.ExecuteSql("SELECT id, \"Größe\", astral FROM " + t + " WHERE \"Größe\" = '" + word + "'",
+                n);
   EXPECT_EQ(db.GetColumnDescription(2).name, "Größe");
   ASSERT_EQ(db.GetColumnIndex("größe"), 2);
   db.AllocateCache();
@@ -236,6 +240,8 @@ TEST_P(SourceTest, TextOutsideLatin1PassesWholeInStatementsNamesValuesAndMessage
   EXPECT_EQ(v.GetInteger(), 1);
   db.GetColumnValueFromCache("Größe", VALUE_TYPE::AsciiString, v);
   EXPECT_EQ(v.Narrow(), word);
+  db.GetColumnValueFromCache("astral", VALUE_TYPE::AsciiString, v);
+  EXPECT_EQ(v.Narrow(), astral.substr(0, 1 + 1999 * 4));  // 2,000 whole characters
   EXPECT_EQ(db.MoveNext(), 1);
 
   // The driver's own message quotes the name as written.

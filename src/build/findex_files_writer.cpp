@@ -2,11 +2,15 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cmath>
+#include <cstring>
 #include <limits>
 #include <new>
 #include <optional>
 #include <vector>
 
+#include "build/sort_entry.h"
+#include "build/sort_stream.h"
 #include "platform/file_io.h"
 #include "shared/bfile.h"
 #include "shared/column_set.h"
@@ -87,26 +91,56 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
       throw CPiFIndexException::Text("Unknown findex type %i", kMethod, nullptr, header.FindexType);
     }
     const auto type = static_cast<VALUE_TYPE>(header.FindexType);
-    std::vector<int32_t> row(static_cast<std::size_t>(columns.Width()));
+    const int32_t width = columns.Width();
+    const auto row_bytes = static_cast<std::size_t>(width) * 4;
+    // Entries are taken in place from large pieces of the file; a value is
+    // decoded only where its bytes differ from the current word's.
+    const SortEntryLayout layout(width, type);
+    SortFileReader reader(layout);
+    reader.Start(sorted);
+    std::vector<int32_t> row(static_cast<std::size_t>(width));
+    auto take_row = [&](const uint8_t* entry) {
+      for (int32_t i = 0; i < width; ++i) {
+        row[static_cast<std::size_t>(i)] = SortEntryLayout::RowItem(entry, i);
+      }
+    };
+    std::vector<uint8_t> current_bytes;  // the encoded value of current
+    auto same_bytes = [&](const uint8_t* value, std::size_t n) {
+      return n == current_bytes.size() && std::memcmp(value, current_bytes.data(), n) == 0;
+    };
     CValue current(type);
     CValue next(type);
-    sorted.ReadRow(row, current);
+    std::size_t size = 0;
+    const uint8_t* entry = reader.Next(size);
+    take_row(entry);
+    layout.DecodeValue(entry, current);
+    current_bytes.assign(entry + row_bytes, entry + size);
     for (bool more = true; more;) {
       tree.AddWord(current, postings.BeginList());
+      // NaN equals nothing, not even its own bytes.
+      const bool nan = type == VALUE_TYPE::Double && std::isnan(current.GetDouble());
       for (;;) {
         postings.AddEntry(row.data());
         ++entries;
-        if (sorted.ReadRow(row, next) != 0) {
+        entry = reader.Next(size);
+        if (entry == nullptr) {
           more = false;
           break;
         }
+        take_row(entry);
+        const uint8_t* value = entry + row_bytes;
+        if (!nan && same_bytes(value, size - row_bytes)) continue;
+        layout.DecodeValue(entry, next);
         const int order = next.Compare(current);
         if (order == -1) {
           throw CPiFIndexException::Text("Sorted entry file out of order at entry %i", kMethod,
                                          nullptr, entries + 1);
         }
         // Values that cannot be ordered (NaN) each stand alone.
-        if (order != 0) break;
+        if (order != 0) {
+          current_bytes.assign(value, entry + size);
+          break;
+        }
       }
       postings.EndList();
       std::swap(current, next);

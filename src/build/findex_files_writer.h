@@ -34,7 +34,7 @@ struct FindexWriteCounts {
   int32_t distinct = 0;  // leaf rows: distinct values
 };
 
-// Reads the entries of sorted from its current position to its end (item
+// Reads the entries of sorted from its start to its end (item
 // rows of header's column set, values of header.FindexType, ascending by
 // value, then key), writes sdx_path and fst_path (created or truncated) and
 // stores the header with BlockNum, WordCount, DistinctWordCount and

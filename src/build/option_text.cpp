@@ -13,7 +13,7 @@ namespace {
 bool BitText(int32_t flags, int32_t option, std::initializer_list<int32_t> bits, std::string& out) {
   for (const int32_t bit : bits) {
     if (option == bit) {
-      out = (flags & bit) != 0 ? "1" : "0";
+      out.assign(1, (flags & bit) != 0 ? '1' : '0');  // a literal trips GCC 12's -Wrestrict
       return true;
     }
   }

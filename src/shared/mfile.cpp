@@ -136,6 +136,18 @@ std::size_t MFile::mread(void* data, std::size_t n) {
   auto* out = static_cast<uint8_t*>(data);
   std::size_t copied = 0;
   while (copied < n) {
+    if (position_ >= valid_ && n - copied >= kBufferSize) {
+      // A large read goes straight to the caller: one call instead of one per
+      // buffer, and no copy through the buffer.
+      const ssize_t r = platform::ReadFull(handle_.Get(), out + copied, n - copied);
+      if (r < 0) throw CMFileException::Text("OS error reading from disk", "mread", nullptr);
+      valid_ = position_ = 0;
+      if (r == 0 && copied == 0) return 0;
+      if (static_cast<std::size_t>(r) < n - copied) {
+        throw CMFileException::Text("EOF error reading from disk", "mread", nullptr);
+      }
+      return n;
+    }
     if (position_ >= valid_ && !mrefill(copied == 0)) return 0;
     const std::size_t take = std::min(n - copied, valid_ - position_);
     std::memcpy(out + copied, buffer_.get() + position_, take);

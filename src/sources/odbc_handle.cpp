@@ -2,9 +2,11 @@
 
 #include <sql.h>
 #include <sqlext.h>
+#include <sqlucode.h>
 
 #include <utility>
 
+#include "platform/text_encoding.h"
 #include "sources/column_text.h"
 
 namespace qm {
@@ -44,9 +46,40 @@ bool OdbcHandle::Free() noexcept {
   return SQL_SUCCEEDED(rc);
 }
 
-OdbcDiagnostic ReadDiagnostic(const OdbcHandle& handle) {
+namespace {
+
+// The message through the wide call: a driver that takes UTF-16 hands it out
+// whole, where the driver manager would narrow it one code unit at a time.
+OdbcDiagnostic ReadWideDiagnostic(const OdbcHandle& handle) {
+  OdbcDiagnostic d;
+  SQLWCHAR state[6] = {};
+  SQLINTEGER native = 0;
+  SQLSMALLINT length = 0;
+  std::u16string message(1024, u'\0');
+  auto ask = [&] {
+    return SQLGetDiagRecW(handle.Type(), handle.Get(), 1, state, &native,
+                          reinterpret_cast<SQLWCHAR*>(message.data()),
+                          static_cast<SQLSMALLINT>(message.size()), &length);
+  };
+  if (!SQL_SUCCEEDED(ask())) return d;
+  if (length >= static_cast<SQLSMALLINT>(message.size())) {
+    message.assign(static_cast<std::size_t>(length) + 1, u'\0');
+    if (!SQL_SUCCEEDED(ask())) return d;
+  }
+  message.resize(std::char_traits<char16_t>::length(message.c_str()));
+  for (int i = 0; i < 5; ++i) d.sqlstate += static_cast<char>(state[i] & 0x7F);
+  std::u16string cut;
+  AssignColumnText(message, kMaxDiagnosticCharacters, cut);
+  d.text = Utf16ToUtf8(cut);
+  return d;
+}
+
+}  // namespace
+
+OdbcDiagnostic ReadDiagnostic(const OdbcHandle& handle, bool wide) {
   OdbcDiagnostic d;
   if (!handle) return d;
+  if (wide) return ReadWideDiagnostic(handle);
   SQLCHAR state[6] = {};
   SQLINTEGER native = 0;
   SQLSMALLINT length = 0;

@@ -46,8 +46,9 @@ struct OdbcDiagnostic {
 };
 
 // The first diagnostic record of a handle; the message is cut at 2,047
-// characters. Without a handle or a record both fields stay empty.
-OdbcDiagnostic ReadDiagnostic(const OdbcHandle& handle);
+// characters. Without a handle or a record both fields stay empty. wide: ask
+// through the wide call (for a connection made through the wide calls).
+OdbcDiagnostic ReadDiagnostic(const OdbcHandle& handle, bool wide = false);
 
 // The SQLSTATE of the first diagnostic record only (cheaper: no message).
 std::string ReadSqlState(const OdbcHandle& handle);

@@ -2,6 +2,7 @@
 
 #include <sql.h>
 #include <sqlext.h>
+#include <sqlucode.h>
 
 #include <algorithm>
 #include <bit>
@@ -46,6 +47,28 @@ SQLHDBC Dbc(const OdbcHandle& h) { return static_cast<SQLHDBC>(h.Get()); }
 
 SQLCHAR* SqlText(const std::string& s) {
   return reinterpret_cast<SQLCHAR*>(const_cast<char*>(s.c_str()));
+}
+
+SQLWCHAR* SqlText(const std::u16string& s) {
+  static_assert(sizeof(SQLWCHAR) == sizeof(char16_t));
+  return reinterpret_cast<SQLWCHAR*>(const_cast<char16_t*>(s.c_str()));
+}
+
+// Text that only survives a trip through the driver unchanged when the driver
+// takes UTF-16 itself: the driver manager narrows wide text for drivers
+// without wide entry points, one code unit at a time.
+constexpr std::u16string_view kWideProbe = u"select '\u00e9\u4e2d\U0001F600'";
+
+// Whether the driver behind a connection takes UTF-16 text without the driver
+// manager converting it.
+bool TakesWideText(SQLHDBC connection) {
+  std::u16string probe(kWideProbe);
+  SQLWCHAR answer[64] = {};
+  SQLINTEGER length = 0;
+  const SQLRETURN rc = SQLNativeSqlW(connection, SqlText(probe), static_cast<SQLINTEGER>(probe.size()),
+                                     answer, static_cast<SQLINTEGER>(std::size(answer)), &length);
+  return SQL_SUCCEEDED(rc) && length == static_cast<SQLINTEGER>(probe.size()) &&
+         std::memcmp(answer, probe.data(), probe.size() * sizeof(char16_t)) == 0;
 }
 
 // A name cut by the driver's buffer may end inside a character: drop that tail.
@@ -151,22 +174,50 @@ void CShareDatabase::Connect() {
       throw CShareDatabaseException::Text("Error allocating resource", "Connect", nullptr);
     }
 
-    if (defs_.GetConnectionMode() == ConnectionMode::ConnectionString) {
-      const std::string text = defs_.ExpandPlaceholders(defs_.GetConnectionString());
+    wide_calls_ = false;
+    const bool by_string = defs_.GetConnectionMode() == ConnectionMode::ConnectionString;
+    const std::string text =
+        by_string ? defs_.ExpandPlaceholders(defs_.GetConnectionString()) : std::string();
+    const std::string dsn = by_string ? std::string() : defs_.GetDsn();
+    std::string user = by_string ? std::string() : defs_.GetUserId();
+    std::string password = by_string ? std::string() : defs_.GetPassword();
+    if (IsEmptyKeyword(user)) user.clear();
+    if (IsEmptyKeyword(password)) password.clear();
+    const char* method = by_string ? "SQLDriverConnect" : "SQLConnect";
+
+    // The narrow calls first: every driver takes them, and text passes as it is.
+    SQLRETURN rc = SQL_ERROR;
+    if (by_string) {
       SQLCHAR out[1024];
       SQLSMALLINT out_length = 0;
-      const SQLRETURN rc = SQLDriverConnect(Dbc(connection), nullptr, SqlText(text), SQL_NTS, out,
-                                            sizeof out, &out_length, SQL_DRIVER_NOPROMPT);
-      if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLDriverConnect");
+      rc = SQLDriverConnect(Dbc(connection), nullptr, SqlText(text), SQL_NTS, out, sizeof out,
+                            &out_length, SQL_DRIVER_NOPROMPT);
     } else {
-      const std::string dsn = defs_.GetDsn();
-      std::string user = defs_.GetUserId();
-      std::string password = defs_.GetPassword();
-      if (IsEmptyKeyword(user)) user.clear();
-      if (IsEmptyKeyword(password)) password.clear();
-      const SQLRETURN rc = SQLConnect(Dbc(connection), SqlText(dsn), SQL_NTS, SqlText(user),
-                                      SQL_NTS, SqlText(password), SQL_NTS);
-      if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, "SQLConnect");
+      rc = SQLConnect(Dbc(connection), SqlText(dsn), SQL_NTS, SqlText(user), SQL_NTS,
+                      SqlText(password), SQL_NTS);
+    }
+    if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, method);
+
+    // A driver with wide entry points describes wide text columns as such only
+    // on a connection made through the wide calls: connect again that way.
+    if (TakesWideText(Dbc(connection))) {
+      SQLDisconnect(Dbc(connection));
+      wide_calls_ = true;
+      if (by_string) {
+        const std::u16string wide_text = Utf8ToUtf16(text);
+        SQLWCHAR out[1024];
+        SQLSMALLINT out_length = 0;
+        rc = SQLDriverConnectW(Dbc(connection), nullptr, SqlText(wide_text), SQL_NTS, out,
+                               static_cast<SQLSMALLINT>(std::size(out)), &out_length,
+                               SQL_DRIVER_NOPROMPT);
+      } else {
+        const std::u16string wide_dsn = Utf8ToUtf16(dsn);
+        const std::u16string wide_user = Utf8ToUtf16(user);
+        const std::u16string wide_password = Utf8ToUtf16(password);
+        rc = SQLConnectW(Dbc(connection), SqlText(wide_dsn), SQL_NTS, SqlText(wide_user), SQL_NTS,
+                         SqlText(wide_password), SQL_NTS);
+      }
+      if (!SQL_SUCCEEDED(rc)) RaiseFrom(connection, method);
     }
 
     OdbcHandle statement;
@@ -191,6 +242,7 @@ void CShareDatabase::Disconnect() {
     end_of_data_ = true;
     first_fetch_empty_ = false;
     cache_valid_ = false;
+    wide_calls_ = false;
     // Release everything first, then report the first refusal.
     const char* failure = nullptr;
     if (statement_) {
@@ -213,7 +265,7 @@ void CShareDatabase::Disconnect() {
 // ---------------------------------------------------------------- diagnostics
 
 std::string CShareDatabase::TakeDiagnostic(const OdbcHandle& handle) {
-  OdbcDiagnostic d = ReadDiagnostic(handle);
+  OdbcDiagnostic d = ReadDiagnostic(handle, wide_calls_);
   last_diagnostic_ = d.text.empty() ? std::string(kNoExplanation) : std::move(d.text);
   last_diagnostic_w_ = Utf8ToUtf16(last_diagnostic_);
   return d.sqlstate;
@@ -248,6 +300,12 @@ void CShareDatabase::CloseCursor() {
   if (statement_) SQLFreeStmt(Stmt(statement_), SQL_CLOSE);
 }
 
+int16_t CShareDatabase::Prepare(const std::string& statement) {
+  if (!wide_calls_) return SQLPrepare(Stmt(statement_), SqlText(statement), SQL_NTS);
+  const std::u16string wide = Utf8ToUtf16(statement);
+  return SQLPrepareW(Stmt(statement_), SqlText(wide), SQL_NTS);
+}
+
 void CShareDatabase::ExecuteSql(std::string_view statement, int16_t& column_count) {
   Guarded("ExecuteSql", [&] {
     if (!statement_) {
@@ -263,7 +321,7 @@ void CShareDatabase::ExecuteSql(std::string_view statement, int16_t& column_coun
     columns_.clear();
     statement_text_.assign(statement);
 
-    if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(statement_text_), SQL_NTS))) {
+    if (!SQL_SUCCEEDED(Prepare(statement_text_))) {
       RaiseFrom(statement_, "ExecuteSql", statement_text_);
     }
     const SQLRETURN executed = SQLExecute(Stmt(statement_));
@@ -299,21 +357,35 @@ void CShareDatabase::ExecuteSql(std::string_view statement, int16_t& column_coun
 void CShareDatabase::DescribeColumns(int16_t count) {
   columns_.resize(static_cast<std::size_t>(count));
   for (int16_t i = 1; i <= count; ++i) {
-    SQLCHAR name[kColumnNameBytes] = {};
     SQLSMALLINT name_length = 0;
     SQLSMALLINT type = 0;
     SQLULEN size = 0;
     SQLSMALLINT digits = 0;
     SQLSMALLINT nullable = 0;
-    if (!SQL_SUCCEEDED(SQLDescribeCol(Stmt(statement_), static_cast<SQLUSMALLINT>(i), name,
-                                      sizeof name, &name_length, &type, &size, &digits,
-                                      &nullable))) {
-      RaiseFrom(statement_, "ExecuteSql", statement_text_);
+    std::string name;
+    if (wide_calls_) {
+      SQLWCHAR wide_name[kColumnNameBytes] = {};
+      if (!SQL_SUCCEEDED(SQLDescribeColW(Stmt(statement_), static_cast<SQLUSMALLINT>(i),
+                                         wide_name, static_cast<SQLSMALLINT>(std::size(wide_name)),
+                                         &name_length, &type, &size, &digits, &nullable))) {
+        RaiseFrom(statement_, "ExecuteSql", statement_text_);
+      }
+      std::u16string units(reinterpret_cast<const char16_t*>(wide_name));
+      // A name cut by the buffer may end between the halves of a pair.
+      if (!units.empty() && units.back() >= 0xD800 && units.back() <= 0xDBFF) units.pop_back();
+      name = Utf16ToUtf8(units);
+      name.resize(Utf8CutLength(name, kColumnNameBytes - 1));
+    } else {
+      SQLCHAR narrow_name[kColumnNameBytes] = {};
+      if (!SQL_SUCCEEDED(SQLDescribeCol(Stmt(statement_), static_cast<SQLUSMALLINT>(i), narrow_name,
+                                        sizeof narrow_name, &name_length, &type, &size, &digits,
+                                        &nullable))) {
+        RaiseFrom(statement_, "ExecuteSql", statement_text_);
+      }
+      name = WholeCharacters(reinterpret_cast<const char*>(narrow_name));
     }
     Column& c = columns_[static_cast<std::size_t>(i - 1)];
-    c.description.name = WholeCharacters(
-        std::string_view(reinterpret_cast<const char*>(name),
-                         std::char_traits<char>::length(reinterpret_cast<const char*>(name))));
+    c.description.name = std::move(name);
     c.description.upper_name = ToUpper(c.description.name);
     c.description.sql_type = type;
     c.description.decimal_digits = digits;
@@ -766,7 +838,7 @@ void CShareDatabase::CreateIndex(std::string_view statement) {
     const std::string rest = RestAfterIndexName(statement);
     // The plain name only tests that the data source takes the statement.
     const std::string probe = "create index " + std::string(kTypindex) + " " + rest;
-    if (!SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(probe), SQL_NTS))) {
+    if (!SQL_SUCCEEDED(Prepare(probe))) {
       TakeDiagnostic(statement_);
       throw refused();
     }
@@ -775,7 +847,7 @@ void CShareDatabase::CreateIndex(std::string_view statement) {
       CloseCursor();
       const std::string sql =
           "create index " + std::string(kTypindex) + std::to_string(i) + " " + rest;
-      if (SQL_SUCCEEDED(SQLPrepare(Stmt(statement_), SqlText(sql), SQL_NTS)) &&
+      if (SQL_SUCCEEDED(Prepare(sql)) &&
           SQL_SUCCEEDED(SQLExecute(Stmt(statement_)))) {
         created = true;
       } else {

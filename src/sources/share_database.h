@@ -5,8 +5,10 @@
 // between types on request. Binary columns are copied into temporary work files
 // whose paths stand in for the data.
 //
-// Text goes through the narrow ODBC calls as UTF-8; wide columns are read as
-// UTF-16. Every failure raises CShareDatabaseException with the driver's own
+// Text goes through the narrow ODBC calls as UTF-8, except to a driver that
+// takes UTF-16 itself: that one is connected, sent statements and asked for
+// names and diagnostics through the wide calls, so it describes its wide text
+// columns as such. Wide columns are read as UTF-16. Every failure raises CShareDatabaseException with the driver's own
 // diagnostic text; an empty result raises CShareDatabaseWarning on the first
 // column read. One thread at a time.
 #pragma once
@@ -56,6 +58,8 @@ class CShareDatabase {
   // Frees statement, connection and environment, each only if held.
   void Disconnect();
   bool IsConnected() const { return static_cast<bool>(connection_); }
+  // Whether the connection goes through the wide calls (see above).
+  bool UsesWideCalls() const { return wide_calls_; }
 
   // Runs a statement and positions on its first row. REQUIRES: connected.
   void ExecuteSql(std::string_view statement, int16_t& column_count);
@@ -121,6 +125,8 @@ class CShareDatabase {
 
   void CheckIndex(int index, const char* method) const;
   void CloseCursor();
+  // SQLPrepare, or SQLPrepareW on a connection through the wide calls.
+  int16_t Prepare(const std::string& statement);
   // Reads the first diagnostic record of handle into the last diagnostic and
   // returns its SQLSTATE; "No explanation from database" when there is none.
   std::string TakeDiagnostic(const OdbcHandle& handle);
@@ -144,6 +150,7 @@ class CShareDatabase {
   OdbcHandle environment_;
   OdbcHandle connection_;
   OdbcHandle statement_;
+  bool wide_calls_ = false;
   bool row_available_ = false;
   bool end_of_data_ = true;
   bool first_fetch_empty_ = false;

@@ -1,5 +1,7 @@
 #include "text/stop_words.h"
 
+#include <algorithm>
+
 #include "platform/text_encoding.h"
 #include "text/language_file.h"
 
@@ -12,6 +14,7 @@ StopWordList StopWordList::FromText(std::u16string_view text) {
   for (const auto token : tokens) {
     std::u16string word = ToUpper(token);
     word.resize(Utf16CutLength(word, kMaxWordLength));
+    list.longest_ = std::max(list.longest_, word.size());
     list.words_.insert(std::move(word));
   }
   return list;

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <string>
 #include <string_view>
@@ -19,17 +20,28 @@ class StopWordList {
   static StopWordList FromText(std::u16string_view text);
 
   // `word` must already be upper case, as the word splitter delivers it.
-  bool Contains(std::u16string_view word) const { return words_.find(word) != words_.end(); }
+  bool Contains(std::u16string_view word) const {
+    // Most words of a text are longer than any stop word: no lookup for them.
+    return word.size() <= longest_ && words_.find(word) != words_.end();
+  }
   std::size_t Size() const { return words_.size(); }
 
  private:
+  // FNV-1a over the code units: every word of every indexed text is looked
+  // up, and a general byte hash costs more than the short words it hashes.
   struct Hash {
     using is_transparent = void;
     std::size_t operator()(std::u16string_view s) const noexcept {
-      return std::hash<std::u16string_view>{}(s);
+      uint64_t h = 14695981039346656037ull;
+      for (const char16_t c : s) {
+        h ^= c;
+        h *= 1099511628211ull;
+      }
+      return static_cast<std::size_t>(h);
     }
   };
   std::unordered_set<std::u16string, Hash, std::equal_to<>> words_;
+  std::size_t longest_ = 0;  // units of the longest stop word
 };
 
 }  // namespace qm::text

@@ -116,6 +116,32 @@ TEST_F(MFileTest, EndOfFile) {
             "EOF error reading from disk (Module:MFile,Method:mread)");
 }
 
+TEST_F(MFileTest, LargeReadsAfterBufferedOnesKeepBytesAndPosition) {
+  std::string content;
+  for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 23));
+  test::WriteFile(Path("l"), content);
+  MFile f;
+  f.OpenFile(Path("l"), MFile::kOpenOrCreate);
+  std::string got(100, '\0');
+  ASSERT_EQ(f.mread(got.data(), got.size()), got.size());
+  // The rest of the buffer, then more than a buffer from the file.
+  got.assign(6000, '\0');
+  ASSERT_EQ(f.mread(got.data(), got.size()), got.size());
+  EXPECT_EQ(got, content.substr(100, 6000));
+  f.mwrite("XY", 2);  // lands right behind the bytes read
+  f.MCommit();
+  content.replace(6100, 2, "XY");
+  EXPECT_EQ(test::ReadFile(Path("l")), content);
+  got.assign(5898, '\0');
+  ASSERT_EQ(f.mread(got.data(), got.size()), got.size());
+  EXPECT_EQ(got, content.substr(6102));
+  EXPECT_EQ(f.mread(got.data(), got.size()), 0u) << "nothing left at all";
+  // A large read that finds the end in its middle fails.
+  f.Seek(7000);
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(got.data(), got.size()); }),
+            "EOF error reading from disk (Module:MFile,Method:mread)");
+}
+
 TEST_F(MFileTest, TypedItemsRoundTripInTheirByteLayout) {
   const DateTimeValue date{2004, 3, 9, 14, 5, 7, 123456};
   CValue text, wide, number, when;

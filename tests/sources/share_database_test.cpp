@@ -93,6 +93,7 @@ class SourceTest : public DatabaseTest, public ::testing::WithParamInterface<Sou
   }
 
   bool Postgres() const { return GetParam() != Source::SQLite; }
+  bool Wide() const { return GetParam() == Source::PostgresUnicode; }
   std::string Blob(const char* hex) const {
     return Postgres() ? "'\\x" + std::string(hex) + "'::bytea" : "X'" + std::string(hex) + "'";
   }
@@ -125,11 +126,16 @@ TEST_P(SourceTest, EveryColumnKindReadsTheSameThroughEveryDriver) {
   int16_t n = 0;
   db.ExecuteSql("SELECT id, Title, body, r, dbl, price, d, ts, data FROM " + t + " ORDER BY id", n);
   ASSERT_EQ(n, 9);
-  const VALUE_TYPE types[] = {
-      VALUE_TYPE::Integer,  VALUE_TYPE::AsciiString, VALUE_TYPE::AsciiString,
-      VALUE_TYPE::Double,   VALUE_TYPE::Double,      VALUE_TYPE::Double,
-      VALUE_TYPE::DateTime, VALUE_TYPE::DateTime,    VALUE_TYPE::AsciiString};
+  // Only the Unicode PostgreSQL driver describes its text columns as wide.
+  const VALUE_TYPE text = Wide() ? VALUE_TYPE::UnicodeString : VALUE_TYPE::AsciiString;
+  const VALUE_TYPE types[] = {VALUE_TYPE::Integer,  text,
+                              text,                 VALUE_TYPE::Double,
+                              VALUE_TYPE::Double,   VALUE_TYPE::Double,
+                              VALUE_TYPE::DateTime, VALUE_TYPE::DateTime,
+                              VALUE_TYPE::AsciiString};
   for (int i = 1; i <= n; ++i) EXPECT_EQ(db.MapColumnType(i), types[i - 1]) << i;
+  EXPECT_EQ(db.GetColumnDescription(2).sql_type, Wide() ? -9 : 12);
+  EXPECT_EQ(db.GetColumnDescription(3).sql_type, Wide() ? -10 : -1);
   EXPECT_EQ(db.GetColumnIndex("title"), 2);
   EXPECT_EQ(db.GetColumnIndex("TITLE"), 2);
   EXPECT_EQ(db.GetColumnIndex("\"Title\""), 2);
@@ -207,6 +213,42 @@ TEST_P(SourceTest, EveryColumnKindReadsTheSameThroughEveryDriver) {
   EXPECT_EQ(db.MoveNext(), 1);
   Run(db, "DROP TABLE " + t);
   db.Disconnect();
+}
+
+TEST_P(SourceTest, TextOutsideLatin1PassesWholeInStatementsNamesValuesAndMessages) {
+  CShareDatabase db(defs_);
+  db.Connect();
+  EXPECT_EQ(db.UsesWideCalls(), Wide());
+  const std::string t = UniqueTable("names");
+  const std::string word = "Grüße 中文 😀";
+  // Pieces of 4-byte characters (or surrogate pairs) end inside them.
+  std::string astral = "a";
+  for (int i = 0; i < 3000; ++i) astral += "😀";
+  Run(db, "CREATE TABLE " + t + " (id INTEGER, \"Größe\" VARCHAR(40), astral TEXT)");
+  Run(db, "INSERT INTO " + t + " VALUES (1, '" + word + "', '" + astral + "')");
+  Run(db, "INSERT INTO " + t + " VALUES (2, 'other', NULL)");
+  // The literal must reach the data source as written to find its row.
+  int16_t n = 0;
+  db.ExecuteSql("SELECT id, \"Größe\", astral FROM " + t + " WHERE \"Größe\" = '" + word + "'",
+                n);
+  EXPECT_EQ(db.GetColumnDescription(2).name, "Größe");
+  ASSERT_EQ(db.GetColumnIndex("größe"), 2);
+  db.AllocateCache();
+  db.CacheColumns();
+  CValue v;
+  db.GetColumnValueFromCache(1, VALUE_TYPE::Integer, v);
+  EXPECT_EQ(v.GetInteger(), 1);
+  db.GetColumnValueFromCache("Größe", VALUE_TYPE::AsciiString, v);
+  EXPECT_EQ(v.Narrow(), word);
+  db.GetColumnValueFromCache("astral", VALUE_TYPE::AsciiString, v);
+  EXPECT_EQ(v.Narrow(), astral.substr(0, 1 + 1999 * 4));  // 2,000 whole characters
+  EXPECT_EQ(db.MoveNext(), 1);
+
+  // The driver's own message quotes the name as written.
+  const std::string missing = "kein_größe_表";
+  ErrorText([&] { db.ExecuteSql("SELECT x FROM " + missing, n); });
+  EXPECT_NE(db.GetLastDiagnostic().find(missing), std::string::npos) << db.GetLastDiagnostic();
+  Run(db, "DROP TABLE " + t);
 }
 
 TEST_P(SourceTest, EmptyResultWarnsOnFirstReadAndEndsTheRows) {
@@ -517,7 +559,7 @@ TEST_F(PostgresTest, DsnModeSendsEmptyUserAsEmpty) {
   int16_t n = 0;
   db.ExecuteSql("SELECT current_user", n);
   CValue user;
-  db.GetColumnValue(1, user, true);
+  db.GetColumnValue(1, user, true, static_cast<int32_t>(VALUE_TYPE::AsciiString));
   EXPECT_EQ(user.Narrow(), "postgres");
   db.Disconnect();
 

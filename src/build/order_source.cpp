@@ -102,6 +102,13 @@ bool OrderSource::HasTextColumn() const {
                      [](const Plan::Column& c) { return IsTextType(c.type); });
 }
 
+void OrderSource::KeepTextForms(const COrderInfo& stored) {
+  for (std::size_t i = 0; i < plan_->columns.size() && i < stored.Columns.size(); ++i) {
+    const VALUE_TYPE form = OrderColumnLayout::Of(stored.Columns[i]).type;
+    if (IsTextType(plan_->columns[i].type) && IsTextType(form)) plan_->columns[i].type = form;
+  }
+}
+
 std::vector<OrderColumnLayout> OrderSource::Layouts(bool ranks) const {
   std::vector<OrderColumnLayout> layouts;
   int32_t first = 1;

@@ -37,6 +37,10 @@ class OrderSource {
 
   // True when an order column is text: such an order stores ranks (type 2).
   bool HasTextColumn() const;
+  // For an update: a text column that stored is text too is read in stored's
+  // form (narrow or wide), whatever form the driver gives it in, so the new
+  // values merge with the stored ones. Columns pair by position.
+  void KeepTextForms(const COrderInfo& stored);
   // The column layouts of an order of ranks (one slot each, in the column's
   // own type) or of values (one slot for an integer, two for a double or a
   // date/time).

@@ -201,6 +201,10 @@ void CPiOrder::BuildOrder(COrderInfo& definition, bool rebuild, bool ranks_only,
     }
 
     OrderSource source(defs_, definition, method);
+    // The driver may give the stored order's text in the other form (the
+    // Unicode PostgreSQL driver gives it wide since connections use the wide
+    // calls); the stored column files stay in theirs.
+    if (!rebuild) source.KeepTextForms(*replaced);
     // An update keeps the stored order's type 2: its values stay ranks.
     const bool ranks = ranks_only || source.HasTextColumn() ||
                        (!rebuild && replaced->OrderType == kOrderTypeRanks);

@@ -9,9 +9,11 @@
 // values), writes the files under temporary names and moves them into place
 // under the exclusive kind 3 lock. An update (no rebuild) reads only the
 // rows past the highest key (or date/time update key) of the stored order
-// and merges them with it; a key read again replaces its older row. An
-// update whose order type, columns or row layout differ from the stored
-// order's raises "Order definition changed, rebuild required".
+// and merges them with it; a key read again replaces its older row. Text
+// read for an update takes the stored column's form (narrow or wide) when
+// the driver gives the other one. An update whose order type, columns or
+// row layout differ from the stored order's raises "Order definition
+// changed, rebuild required".
 //
 // Callers that run commands hold the command lock of the order
 // ("MORVIL_SYNCHRONIZE_ORDER" + name) around builds and drops, so one order

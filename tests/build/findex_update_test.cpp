@@ -14,6 +14,7 @@
 #include <string>
 #include <thread>
 #include <tuple>
+#include <variant>
 #include <vector>
 
 #include "build/data_source_fixture.h"
@@ -284,15 +285,23 @@ TEST_P(FindexUpdateTest, AddOnsAreBuiltWithTheStoredDefinitionAndOptions) {
   EXPECT_EQ(add_on.LanguageFlags, stored.LanguageFlags);
   EXPECT_EQ(add_on.Columns, stored.Columns);
   EXPECT_EQ(add_on.SortMax, 701);
+  // Text words in the form the driver gives: UTF-16 only through the Unicode
+  // PostgreSQL driver.
+  const int32_t text_type = GetParam() == Source::PostgresUnicode ? 4 : 2;
+  EXPECT_EQ(stored.FindexType, text_type);
+  EXPECT_EQ(add_on.FindexType, text_type);
   const test::DecodedFindex decoded = test::DecodeFindex(
       IndexFolder() + "ROWS_ADD_1.sdx", IndexFolder() + "ROWS_ADD_1.fst", add_on.FindexType, 3);
   EXPECT_EQ(decoded.faults, std::vector<std::string>{});
   // Stemmed, with the body's weight: (word, key, weight) of each posting.
   std::vector<std::tuple<std::string, int32_t, int32_t>> postings;
   for (const test::Word& word : decoded.words) {
+    const auto* wide = std::get_if<std::u16string>(&word.value);
+    const auto* narrow = std::get_if<std::string>(&word.value);
+    ASSERT_TRUE(wide != nullptr || narrow != nullptr) << "a word that is not text";
     for (const test::Posting& p : word.postings) {
       ASSERT_EQ(p.size(), 3u) << "key, weight and position";
-      postings.emplace_back(std::get<std::string>(word.value), p[0], p[1]);
+      postings.emplace_back(wide != nullptr ? Utf16ToUtf8(*wide) : *narrow, p[0], p[1]);
     }
   }
   EXPECT_EQ(postings, (std::vector<std::tuple<std::string, int32_t, int32_t>>{{"FRESH", 701, 2},

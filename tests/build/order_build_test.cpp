@@ -254,6 +254,45 @@ TEST_P(OrderBuildTest, UpdatesReadLaterRowsAndReplaceTheRowsOfKeysReadAgain) {
   EXPECT_TRUE(home_.WorkFiles().empty());
 }
 
+// The two PostgreSQL drivers give the same text columns narrow (ANSI) and
+// wide (Unicode): an order built through one and updated through the other.
+TEST_P(OrderBuildTest, UpdatesKeepTheStoredTextFormWhateverFormTheDriverGives) {
+  if (GetParam() == Source::SQLite) GTEST_SKIP() << "SQLite gives narrow text only";
+  const Source other =
+      GetParam() == Source::PostgresAnsi ? Source::PostgresUnicode : Source::PostgresAnsi;
+  if (test::PostgresConnection(other).empty()) GTEST_SKIP() << "needs both PostgreSQL drivers";
+  const bool wide = GetParam() == Source::PostgresUnicode;
+  const std::string t = Table("id INTEGER, label VARCHAR(20)");
+  Run("INSERT INTO " + t + " VALUES (1, 'ｆig'), (2, 'Äpfel'), (3, 'apple')");
+  auto order = [&] {
+    COrderInfo d = Order("Forms", t, {"label"});
+    d.GeneralFlags = 1;  // ignore case
+    d.IgnoreChars = u"-";
+    return d;
+  };
+  COrderInfo built = order();
+  Build(built);
+  ASSERT_EQ(test::DecodeOrderHeader(File("FORMS.sri")).columns.at(0).type, wide ? 4 : 2);
+
+  home_.Defs().SetConnectionString(test::PostgresConnection(other), "test");
+  Run("INSERT INTO " + t + " VALUES (4, '-äpfel'), (5, '😀'), (6, 'APPLE-')");
+  COrderInfo update = order();
+  update.IgnoreChars.clear();  // the stored order's preparation applies
+  ASSERT_EQ(Failure(update, false), "no error");
+
+  EXPECT_EQ(test::DecodeOrderHeader(File("FORMS.sri")).columns.at(0).type, wide ? 4 : 2);
+  // Values read in the other form are prepared and meet their stored equals;
+  // the stored form's comparison places them: U+FF26 (EF BC A6) before
+  // U+1F600 (F0 ...) in UTF-8, after it (D83D ...) in UTF-16.
+  const Entries narrow_order{{"APPLE", {3, 6}}, {"ÄPFEL", {2, 4}}, {"ＦIG", {1}}, {"😀", {5}}};
+  const Entries wide_order{{"APPLE", {3, 6}}, {"ÄPFEL", {2, 4}}, {"😀", {5}}, {"ＦIG", {1}}};
+  EXPECT_EQ(ColumnOf("FORMS", "LABEL"), wide ? wide_order : narrow_order);
+  const int32_t fig = wide ? 3 : 2;
+  const int32_t smiley = wide ? 2 : 3;
+  EXPECT_EQ(RowsOf("FORMS"), (Rows{{1, fig}, {2, 1}, {3, 0}, {4, 1}, {5, smiley}, {6, 0}}));
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
 TEST_P(OrderBuildTest, DropOrderRemovesEveryFile) {
   if (GetParam() != Source::SQLite) GTEST_SKIP() << "drops do not depend on the driver";
   const std::string t = Table("id INTEGER, a VARCHAR(10), b INTEGER");

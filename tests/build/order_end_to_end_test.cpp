@@ -46,9 +46,23 @@ class OrderEndToEndTest : public test::DataSourceTest {
     return names;
   }
 
-  Entries Column(const std::string& file, int32_t type) {
-    return test::DecodeColumnFile(OrderFolder() + file, type);
+  // The value type code the header of order records for column (both upper-cased).
+  int32_t ColumnType(const std::string& order, const std::string& column) {
+    for (const auto& c : test::DecodeOrderHeader(OrderFolder() + order + ".sri").columns) {
+      if (ToUpper(c.name) == column) return c.type;
+    }
+    ADD_FAILURE() << "order " << order << " has no column " << column;
+    return 0;
   }
+
+  // The column file, read in the value type the header records.
+  Entries Column(const std::string& order, const std::string& column) {
+    return test::DecodeColumnFile(OrderFolder() + order + "_" + column + ".col",
+                                  ColumnType(order, column));
+  }
+
+  // Only the Unicode PostgreSQL driver describes text columns as wide.
+  int32_t TextType() const { return GetParam() == Source::PostgresUnicode ? 4 : 2; }
 
   Rows RowsOf(const std::string& order, int width) {
     return test::DecodeOrderRows(OrderFolder() + order + ".srt", width);
@@ -75,8 +89,10 @@ TEST_P(OrderEndToEndTest, CreateOrderWithTheCurrentOptionsAndEveryInformationVal
 
   EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"TITLES.sri", "TITLES.srt", "TITLES_TITLE.col",
                                                     "TITLES_YEAR.col"}));
-  EXPECT_EQ(Column("TITLES_TITLE.col", 2), (Entries{{"LAKE", {3}}, {"RIVER", {1, 2}}}));
-  EXPECT_EQ(Column("TITLES_YEAR.col", 1), (Entries{{"1999", {1}}, {"2004", {2}}}));
+  EXPECT_EQ(ColumnType("TITLES", "TITLE"), TextType());
+  EXPECT_EQ(ColumnType("TITLES", "YEAR"), 1);
+  EXPECT_EQ(Column("TITLES", "TITLE"), (Entries{{"LAKE", {3}}, {"RIVER", {1, 2}}}));
+  EXPECT_EQ(Column("TITLES", "YEAR"), (Entries{{"1999", {1}}, {"2004", {2}}}));
   EXPECT_EQ(RowsOf("TITLES", 3), (Rows{{1, 1, 0}, {2, 1, 1}, {3, 0, 2147483647}}));
 
   EXPECT_EQ(Info("Titles", odrTableName), books);
@@ -122,7 +138,8 @@ TEST_P(OrderEndToEndTest, UpdatesMergeRefuseOtherDefinitionsAndRebuildsStartOver
   ASSERT_EQ(Run("UPDATE ORDER Fruit"), "");  // the stored definition
   OnSource({"insert into " + t + " values (4, 'apple', 9)"});
   ASSERT_EQ(Run("UPDATE ORDER Fruit ON TABLE " + t + " COLUMNS title,n KEY id"), "");
-  EXPECT_EQ(Column("FRUIT_TITLE.col", 2),
+  EXPECT_EQ(ColumnType("FRUIT", "TITLE"), TextType());
+  EXPECT_EQ(Column("FRUIT", "TITLE"),
             (Entries{{"apple", {2, 4}}, {"fig", {3}}, {"pear", {1}}}));
   EXPECT_EQ(RowsOf("FRUIT", 3), (Rows{{1, 2, 2}, {2, 0, 1}, {3, 1, 0}, {4, 0, 3}}));
 
@@ -156,7 +173,8 @@ TEST_P(OrderEndToEndTest, DateTimeKeyUpdatesReadOnlyLaterRows) {
             "update " + t + " set title = 'unseen' where id = 2",
             "insert into " + t + " values (3, 'new', '2024-01-01 10:00:01')"});
   ASSERT_EQ(Run("UPDATE ORDER Dated"), "");
-  EXPECT_EQ(Column("DATED_TITLE.col", 2),
+  EXPECT_EQ(ColumnType("DATED", "TITLE"), TextType());
+  EXPECT_EQ(Column("DATED", "TITLE"),
             (Entries{{"new", {3}}, {"older", {2}}, {"renewed", {1}}}));
   EXPECT_NE(TraceText().find("changed>'2024-01-01 10:00:00'"), std::string::npos);
 }

@@ -8,6 +8,7 @@
 #include <bit>
 #include <cstdint>
 #include <cstdio>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -16,39 +17,63 @@
 
 namespace qm::test {
 
+// A read past the end of the bytes, or a length or count larger than what
+// is left, stops the decoding: nothing after it would mean anything.
+class DecodeError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
 class LeReader {
  public:
-  explicit LeReader(std::string bytes, std::size_t at = 0) : bytes_(std::move(bytes)), at_(at) {}
+  // name: the file the bytes are from, for the failure text.
+  LeReader(std::string bytes, std::string name, std::size_t at = 0)
+      : bytes_(std::move(bytes)), name_(std::move(name)), at_(at) {}
 
-  uint64_t Unsigned(int n) {
-    if (at_ + n > bytes_.size()) {
-      ADD_FAILURE() << "read past the end at " << at_;
-      at_ = bytes_.size();
-      return 0;
-    }
+  uint64_t Unsigned(std::size_t n) {
+    Require(n, "value");
     uint64_t v = 0;
-    for (int i = n - 1; i >= 0; --i) v = (v << 8) | static_cast<unsigned char>(bytes_[at_ + i]);
+    for (std::size_t i = n; i-- > 0;) v = (v << 8) | static_cast<unsigned char>(bytes_[at_ + i]);
     at_ += n;
     return v;
   }
   int32_t I32() { return static_cast<int32_t>(static_cast<uint32_t>(Unsigned(4))); }
   std::string Narrow() {
     const std::size_t n = Unsigned(2);
+    Require(n, "narrow text");
     std::string s = bytes_.substr(at_, n);
     at_ += n;
     return s;
   }
+  // As UTF-8.
   std::string Wide() {
     const std::size_t n = Unsigned(2);
+    Require(2 * n, "wide text");
     std::u16string s;
     for (std::size_t i = 0; i < n; ++i) s.push_back(static_cast<char16_t>(Unsigned(2)));
     return Utf16ToUtf8(s);
+  }
+  // count 32-bit items follow: refused unless they are all there.
+  void RequireItems(int32_t count, const char* what) {
+    if (count < 0) Fail(std::string("negative ") + what + " " + std::to_string(count));
+    Require(4 * static_cast<std::size_t>(count), what);
   }
   bool AtEnd() const { return at_ >= bytes_.size(); }
   std::size_t Size() const { return bytes_.size(); }
 
  private:
+  void Require(std::size_t n, const char* what) {
+    if (n > bytes_.size() - at_) {
+      Fail(std::string(what) + " of " + std::to_string(n) + " bytes past the end");
+    }
+  }
+  [[noreturn]] void Fail(const std::string& what) const {
+    throw DecodeError(name_ + ": " + what + " at " + std::to_string(at_) + " of " +
+                      std::to_string(bytes_.size()));
+  }
+
   std::string bytes_;
+  std::string name_;
   std::size_t at_;
 };
 
@@ -77,7 +102,7 @@ struct OrderHeader {
 inline OrderHeader DecodeOrderHeader(const std::string& path) {
   const std::string bytes = ReadFile(path);
   EXPECT_EQ(bytes.size(), 4096u) << path;
-  LeReader r(bytes, 6);
+  LeReader r(bytes, path, 6);
   OrderHeader h;
   h.version = r.I32();
   h.version_text = r.Narrow();
@@ -87,6 +112,7 @@ inline OrderHeader DecodeOrderHeader(const std::string& path) {
   h.sql_as_table = r.I32();
   h.sql = r.Narrow();
   const int32_t n = r.I32();
+  if (n < 0) throw DecodeError(path + ": negative column count");
   for (int32_t i = 0; i < n; ++i) {
     HeaderColumn c;
     c.name = r.Narrow();
@@ -103,9 +129,12 @@ inline OrderHeader DecodeOrderHeader(const std::string& path) {
 
 // The count, then count rows of width integers; the file holds nothing else.
 inline std::vector<std::vector<int32_t>> DecodeOrderRows(const std::string& path, int width) {
-  LeReader r(ReadFile(path));
+  LeReader r(ReadFile(path), path);
   const int32_t count = r.I32();
-  EXPECT_EQ(r.Size(), 4u + 4u * static_cast<std::size_t>(width) * count) << path;
+  if (count < 0 || r.Size() != 4u + 4u * static_cast<std::size_t>(width) * count) {
+    throw DecodeError(path + ": " + std::to_string(r.Size()) + " bytes do not hold " +
+                      std::to_string(count) + " rows of " + std::to_string(width));
+  }
   std::vector<std::vector<int32_t>> rows(static_cast<std::size_t>(count));
   for (auto& row : rows) {
     for (int i = 0; i < width; ++i) row.push_back(r.I32());
@@ -127,7 +156,7 @@ inline std::ostream& operator<<(std::ostream& out, const ColumnEntry& e) {
 
 // Entries: the value in the encoding of type, the key count, the keys.
 inline std::vector<ColumnEntry> DecodeColumnFile(const std::string& path, int32_t type) {
-  LeReader r(ReadFile(path));
+  LeReader r(ReadFile(path), path);
   std::vector<ColumnEntry> entries;
   while (!r.AtEnd()) {
     ColumnEntry e;
@@ -151,9 +180,10 @@ inline std::vector<ColumnEntry> DecodeColumnFile(const std::string& path, int32_
                   std::to_string(f[4]);
         break;
       }
-      default: ADD_FAILURE() << "no value type " << type; return entries;
+      default: throw DecodeError(path + ": no value type " + std::to_string(type));
     }
     const int32_t n = r.I32();
+    r.RequireItems(n, "keys");
     for (int32_t i = 0; i < n; ++i) e.keys.push_back(r.I32());
     entries.push_back(std::move(e));
   }

@@ -101,7 +101,12 @@ namespace {
 
 std::string UpperTags(const TagMap& tags) {
   std::string out;
-  for (const auto& [tag, value] : tags) out += ":" + ToUpper(tag) + "=" + value;
+  for (const auto& [tag, value] : tags) {
+    out += ':';
+    out += ToUpper(tag);
+    out += '=';
+    out += value;
+  }
   return out;
 }
 

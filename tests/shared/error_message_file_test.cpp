@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "file_test_util.h"
+#include "shared/core_test_support.h"
 #include "shared/error_messages.h"
 
 namespace qm {

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "file_test_util.h"
+#include "shared/core_test_support.h"
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 
@@ -14,7 +14,7 @@ namespace qm {
 namespace {
 
 using test::EntryTexts;
-using test::RaisedChain;
+using test::ThrownTexts;
 using Texts = std::vector<std::string>;
 
 const std::string kUnknown =
@@ -218,21 +218,21 @@ TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {
   using G = CPiCmdException;
   using GU = CPiCmdUnknownException;
   EXPECT_EQ((Guard<G, GU>("ExecuteW", [] { return 42; })), 42);
-  EXPECT_EQ(RaisedChain<G>([] {
+  EXPECT_EQ(ThrownTexts<G>([] {
               Guard<G, GU>("ExecuteW", [] { throw G::Text("Own", "TranslateW", nullptr); });
             }),
             Texts{"Own (Module:PiCmd,Method:TranslateW)"});
-  EXPECT_EQ(RaisedChain<G>([] {
+  EXPECT_EQ(ThrownTexts<G>([] {
               Guard<G, GU>("ExecuteW", [] { throw CBlockException::Text("Cause", "Read", nullptr); });
             }),
             (Texts{"General Error (Module:PiCmd,Method:ExecuteW)", "Cause (Module:Block,Method:Read)"}));
   // Anything else, an unknown exception from below included, becomes this
   // module's unknown exception with no inner entries.
-  EXPECT_EQ(RaisedChain<GU>([] {
+  EXPECT_EQ(ThrownTexts<GU>([] {
               Guard<G, GU>("ExecuteW", [] { throw std::runtime_error("boom"); });
             }),
             Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
-  EXPECT_EQ(RaisedChain<GU>([] {
+  EXPECT_EQ(ThrownTexts<GU>([] {
               Guard<G, GU>("ExecuteW", [] { throw CMFileUnknownException::Unknown("Read"); });
             }),
             Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
@@ -245,14 +245,14 @@ TEST(Guard, ModulesWithoutUnknownClassPassForeignExceptions) {
   test::ConfiguredHome home;
   EXPECT_THROW((Guard<CBlockException>("Read", [] { throw std::runtime_error("x"); })),
                std::runtime_error);
-  EXPECT_EQ(RaisedChain<CMFileUnknownException>([] {
+  EXPECT_EQ(ThrownTexts<CMFileUnknownException>([] {
               Guard<CBlockException>("Read", [] { throw CMFileUnknownException::Unknown("Get"); });
             }),
             Texts{kUnknown + " (Module:MFile,Method:Get)"});
 }
 
 TEST(Guard, AnErrorCollectsOneGeneralEntryPerBoundary) {
-  const auto texts = RaisedChain<CPiStartPointException>([] {
+  const auto texts = ThrownTexts<CPiStartPointException>([] {
     Guard<CPiStartPointException, CPiStartPointUnknownException>("ExecuteW", [] {
       Guard<CPiFIndexException, CPiFIndexUnknownException>("BuildRowFindex", [] {
         Guard<CBlockException>("InsertRow", [] {

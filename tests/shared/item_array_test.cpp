@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "core_test_support.h"
 #include "file_test_util.h"
 #include "shared/exception_family.h"
 #include "shared/fast_array_int.h"

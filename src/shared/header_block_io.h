@@ -15,6 +15,7 @@
 #include <string>
 #include <string_view>
 
+#include "shared/bfile.h"
 #include "shared/block.h"
 #include "shared/connection_scramble.h"
 #include "shared/exception_family.h"
@@ -106,5 +107,40 @@ class Reader {
   CBlock& block_;
   std::string_view version_text_;
 };
+
+// The walks over a whole header record: `fields(io, record)` lists its fields.
+template <class Record, class Fields>
+int64_t EncodedSize(const Record& record, Fields fields) {
+  SizeCounter io;
+  fields(io, record);
+  return io.Bytes();
+}
+
+template <class Record, class Fields>
+Record ReadBlockZero(BFile& file, std::string_view version_message, Fields fields) {
+  CBlock block(kHeaderBlockUnits);
+  file.SeekToBlock(0);
+  file.ReadBlock(block);
+  Record read;
+  Reader io(block, version_message);
+  fields(io, read);
+  return read;
+}
+
+// Refuses (too_long names the record and takes the sizes) a record that does
+// not fit block 0 before the file is touched.
+template <class Record, class Fields>
+void WriteBlockZero(BFile& file, const Record& record, Fields fields, const char* too_long,
+                    const char* method) {
+  const int64_t size = EncodedSize(record, fields);
+  if (size > kMaxEncodedSize) {
+    throw CHighStructuresException::Text(too_long, method, nullptr, size, kMaxEncodedSize);
+  }
+  CBlock block(kHeaderBlockUnits);
+  Writer io(block);
+  fields(io, record);
+  file.SeekToBlock(0);
+  file.WriteBlock(block);
+}
 
 }  // namespace qm::header_io

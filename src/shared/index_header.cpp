@@ -86,15 +86,13 @@ void IndexHeaderFields(Io& io, Header& h) {
 
 }  // namespace
 
+namespace {
+constexpr auto kFields = [](auto& io, auto& header) { IndexHeaderFields(io, header); };
+}  // namespace
+
 void CIndexHeader::ReadInfo(BFile& file) {
   Guard<CHighStructuresException, CHighStructuresUnknownException>("CIndexHeader::ReadInfo", [&] {
-    CBlock block(header_io::kHeaderBlockUnits);
-    file.SeekToBlock(0);
-    file.ReadBlock(block);
-    CIndexHeader read;
-    header_io::Reader io(block, kVersionMessage);
-    IndexHeaderFields(io, read);
-    *this = std::move(read);
+    *this = header_io::ReadBlockZero<CIndexHeader>(file, kVersionMessage, kFields);
     Trace(TraceLevel2.load(), "PILIB,FILIB,GILIB.(SHARELIB)CIndexHeader.ReadInfo", "Index info read");
   });
 }
@@ -102,25 +100,13 @@ void CIndexHeader::ReadInfo(BFile& file) {
 void CIndexHeader::WriteInfo(BFile& file) const {
   Guard<CHighStructuresException, CHighStructuresUnknownException>("CIndexHeader::WriteInfo", [&] {
     Trace(TraceLevel2.load(), "PILIB,FILIB.(SHARELIB)CIndexHeader.WriteInfo", "Writing index info");
-    const int64_t size = EncodedSize();
-    if (size > header_io::kMaxEncodedSize) {
-      throw CHighStructuresException::Text(
-          "Index definition too long: its header needs %i bytes, block 0 holds %i",
-          "CIndexHeader::WriteInfo", nullptr, size, header_io::kMaxEncodedSize);
-    }
-    CBlock block(header_io::kHeaderBlockUnits);
-    header_io::Writer io(block);
-    IndexHeaderFields(io, *this);
-    file.SeekToBlock(0);
-    file.WriteBlock(block);
+    header_io::WriteBlockZero(file, *this, kFields,
+                              "Index definition too long: its header needs %i bytes, block 0 holds %i",
+                              "CIndexHeader::WriteInfo");
   });
 }
 
-int64_t CIndexHeader::EncodedSize() const {
-  header_io::SizeCounter io;
-  IndexHeaderFields(io, *this);
-  return io.Bytes();
-}
+int64_t CIndexHeader::EncodedSize() const { return header_io::EncodedSize(*this, kFields); }
 
 bool CIndexHeader::FitsHeaderBlock() const { return EncodedSize() <= header_io::kMaxEncodedSize; }
 

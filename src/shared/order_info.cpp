@@ -62,14 +62,13 @@ void OrderInfoFields(Io& io, Info& o) {
 
 }  // namespace
 
+namespace {
+constexpr auto kFields = [](auto& io, auto& info) { OrderInfoFields(io, info); };
+}  // namespace
+
 void COrderInfo::ReadInfo(BFile& file) {
   Guard<CHighStructuresException, CHighStructuresUnknownException>("COrderInfo::ReadInfo", [&] {
-    CBlock block(header_io::kHeaderBlockUnits);
-    file.SeekToBlock(0);
-    file.ReadBlock(block);
-    COrderInfo read;
-    header_io::Reader io(block, kVersionMessage);
-    OrderInfoFields(io, read);
+    COrderInfo read = header_io::ReadBlockZero<COrderInfo>(file, kVersionMessage, kFields);
     read.UpdateSupport = UpdateSupport;
     *this = std::move(read);
     Trace(TraceLevel2.load(), "PILIB,GILIB.(SHARELIB)COrderInfo.ReadInfo", "Order info read");
@@ -79,25 +78,13 @@ void COrderInfo::ReadInfo(BFile& file) {
 void COrderInfo::WriteInfo(BFile& file) const {
   Guard<CHighStructuresException, CHighStructuresUnknownException>("COrderInfo::WriteInfo", [&] {
     Trace(TraceLevel2.load(), "PILIB,GILIB.(SHARELIB)COrderInfo.WriteInfo", "Writing order info");
-    const int64_t size = EncodedSize();
-    if (size > header_io::kMaxEncodedSize) {
-      throw CHighStructuresException::Text(
-          "Order definition too long: its header needs %i bytes, block 0 holds %i",
-          "COrderInfo::WriteInfo", nullptr, size, header_io::kMaxEncodedSize);
-    }
-    CBlock block(header_io::kHeaderBlockUnits);
-    header_io::Writer io(block);
-    OrderInfoFields(io, *this);
-    file.SeekToBlock(0);
-    file.WriteBlock(block);
+    header_io::WriteBlockZero(file, *this, kFields,
+                              "Order definition too long: its header needs %i bytes, block 0 holds %i",
+                              "COrderInfo::WriteInfo");
   });
 }
 
-int64_t COrderInfo::EncodedSize() const {
-  header_io::SizeCounter io;
-  OrderInfoFields(io, *this);
-  return io.Bytes();
-}
+int64_t COrderInfo::EncodedSize() const { return header_io::EncodedSize(*this, kFields); }
 
 bool COrderInfo::FitsHeaderBlock() const { return EncodedSize() <= header_io::kMaxEncodedSize; }
 

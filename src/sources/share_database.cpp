@@ -629,28 +629,27 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
     return kValueNull;
   };
   std::string_view bytes;
+  // Drivers turn numbers they cannot convert into NULL, 0 or a wrapped number
+  // without a word: numbers are read as text and parsed here.
+  auto read_number = [&](auto parse, auto set) {
+    if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
+    if (!parse(bytes)) {
+      throw CShareDatabaseException::Text("Could not convert column value into appropriate type",
+                                          "GetColumnValue", nullptr);
+    }
+    set();
+    return kValueRead;
+  };
   switch (c.read_kind) {
     case ReadKind::Integer: {
-      // Drivers turn values they cannot convert into NULL, 0 or a wrapped
-      // number without a word: take the text and check it here.
-      if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
       int32_t v = 0;
-      if (!ParseInteger32(bytes, v)) {
-        throw CShareDatabaseException::Text("Could not convert column value into appropriate type",
-                                            "GetColumnValue", nullptr);
-      }
-      value.SetInteger(v);
-      return kValueRead;
+      return read_number([&](std::string_view b) { return ParseInteger32(b, v); },
+                         [&] { value.SetInteger(v); });
     }
     case ReadKind::Double: {
-      if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
       double v = 0;
-      if (!ParseDouble(bytes, v)) {
-        throw CShareDatabaseException::Text("Could not convert column value into appropriate type",
-                                            "GetColumnValue", nullptr);
-      }
-      value.SetDouble(v);
-      return kValueRead;
+      return read_number([&](std::string_view b) { return ParseDouble(b, v); },
+                         [&] { value.SetDouble(v); });
     }
     case ReadKind::Timestamp: {
       SQL_TIMESTAMP_STRUCT ts{};

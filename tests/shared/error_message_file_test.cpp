@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/error_messages.h"
 
 namespace qm {

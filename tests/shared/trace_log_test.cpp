@@ -9,7 +9,7 @@
 #include <thread>
 #include <vector>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/exception_family.h"
 
 namespace qm {

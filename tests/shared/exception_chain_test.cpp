@@ -174,7 +174,8 @@ TEST(ExceptionChain, InnerEntriesFollowTheNewOne) {
 }
 
 TEST(ExceptionChain, FamiliesAreDistinctTypes) {
-  auto which = [](auto thrower) -> std::string {
+  test::ConfiguredHome home;
+  const auto which = [](auto thrower) -> std::string {
     try {
       thrower();
     } catch (const CBlockException&) {
@@ -186,12 +187,10 @@ TEST(ExceptionChain, FamiliesAreDistinctTypes) {
     }
     return "none";
   };
-  EXPECT_EQ(which([] { throw CBlockException::General("A"); }), "block");
-  EXPECT_EQ(which([] { throw CBFileException::General("A"); }), "exception");
-  EXPECT_EQ(which([] { throw CShareDatabaseWarning::Text("No data", "Fetch", nullptr); }),
-            "exception");
-  test::ConfiguredHome home;
-  EXPECT_EQ(which([] { throw CMFileUnknownException::Unknown("A"); }), "unknown");
+  EXPECT_EQ(which([] { throw CBlockException::General("A"); }) + which([] { throw CBFileException::General("A"); }) +
+                which([] { throw CShareDatabaseWarning::Text("No data", "Fetch", nullptr); }) +
+                which([] { throw CMFileUnknownException::Unknown("A"); }),
+            "blockexceptionexceptionunknown");
 }
 
 TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {

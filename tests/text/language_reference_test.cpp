@@ -4,9 +4,8 @@
 // rule files, and arbitrary input.
 #include <gtest/gtest.h>
 
-#include <dirent.h>
-
 #include <algorithm>
+#include <filesystem>
 #include <random>
 #include <string>
 #include <vector>
@@ -109,16 +108,10 @@ void ExpectCodes(const text::PhonetRules& rules, const std::vector<std::vector<s
 
 std::vector<std::string> FeatureNames() {
   std::vector<std::string> names;
-  DIR* dir = ::opendir(FixturePath("phonet/features").c_str());
-  if (dir == nullptr) return names;
-  while (const dirent* e = ::readdir(dir)) {
-    const std::string name = e->d_name;
-    const std::string suffix = "_phonet.dat";
-    if (name.size() > suffix.size() && name.ends_with(suffix)) {
-      names.push_back(name.substr(0, name.size() - suffix.size()));
-    }
+  for (const auto& entry : std::filesystem::directory_iterator(FixturePath("phonet/features"))) {
+    const std::string name = entry.path().filename().string();
+    if (name.ends_with("_phonet.dat")) names.push_back(name.substr(0, name.size() - 11));
   }
-  ::closedir(dir);
   std::sort(names.begin(), names.end());
   return names;
 }

@@ -83,17 +83,12 @@ class OtherProcess {
 std::string Msg(const std::string& text, const std::string& method) {
   return text + " (Module:LockManager,Method:" + method + ")";
 }
-std::string SingleRead() {
-  return Msg("Timeout waiting for single read access to an index. Lock name: " + kName,
-             "LockReader");
+std::string Timeout(const std::string& what, const std::string& method) {
+  return Msg("Timeout waiting for " + what + " access to an index. Lock name: " + kName, method);
 }
-std::string AllRead() {
-  return Msg("Timeout waiting for all read access to an index. Lock name: " + kName,
-             "LockAllReaders");
-}
-std::string Write() {
-  return Msg("Timeout waiting for write access to an index. Lock name: " + kName, "LockWriter");
-}
+const std::string kSingleRead = Timeout("single read", "LockReader");
+const std::string kAllRead = Timeout("all read", "LockAllReaders");
+const std::string kWrite = Timeout("write", "LockWriter");
 
 template <class Op>
 std::string FailureOf(Op op) {
@@ -172,14 +167,8 @@ TEST_F(LockManagerTest, LockFilesAreOpenToEveryAccountAndNotInherited) {
 }
 
 TEST_F(LockManagerTest, NamesThatCannotStandAsFileNamesAreDistinctLocks) {
-  const std::vector<std::string> names = {"",
-                                          ".",
-                                          "..",
-                                          "a/b",
-                                          "a%2Fb",
-                                          "tab\there",
-                                          std::string(300, 'x') + "1",
-                                          std::string(300, 'x') + "2"};
+  const std::vector<std::string> names = {"", ".", "..", "a/b", "a%2Fb", "tab\there",
+                                          std::string(300, 'x') + "1", std::string(300, 'x') + "2"};
   std::vector<std::unique_ptr<CLockManager>> held;
   for (const auto& name : names) {
     held.push_back(std::make_unique<CLockManager>(name));
@@ -204,8 +193,8 @@ TEST_F(LockManagerTest, ReadersAndWritersExcludeEachOtherAcrossProcesses) {
     OtherProcess builder(kShort, "exclusive");
     ASSERT_EQ(builder.Outcome(), "held");
     CLockManager search(kName);
-    EXPECT_EQ(FailureOf([&] { search.LockReader(); }), SingleRead());
-    EXPECT_EQ(FailureOf([&] { search.LockWriter(); }), Write());
+    EXPECT_EQ(FailureOf([&] { search.LockReader(); }), kSingleRead);
+    EXPECT_EQ(FailureOf([&] { search.LockWriter(); }), kWrite);
     EXPECT_EQ(search.ReaderCount(), 0);
     EXPECT_FALSE(search.HoldsWriter());
     EXPECT_EQ(builder.Release(), 0);
@@ -215,7 +204,7 @@ TEST_F(LockManagerTest, ReadersAndWritersExcludeEachOtherAcrossProcesses) {
     OtherProcess search(kShort, "reader");
     ASSERT_EQ(search.Outcome(), "held");
     CLockManager builder(kName);
-    EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), AllRead());
+    EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), kAllRead);
   }
   {
     // The writer alone keeps out writers, not readers.
@@ -224,7 +213,7 @@ TEST_F(LockManagerTest, ReadersAndWritersExcludeEachOtherAcrossProcesses) {
     CLockManager search(kName);
     EXPECT_NO_THROW(search.LockReader());
     OtherProcess second_sync(kShort, "writer");
-    EXPECT_EQ(second_sync.Outcome(), "failed " + Write());
+    EXPECT_EQ(second_sync.Outcome(), "failed " + kWrite);
   }
 }
 
@@ -233,9 +222,9 @@ TEST_F(LockManagerTest, HundredReaderUnits) {
   ASSERT_EQ(first.Outcome(), "held");
   const auto readers = TakeReaders(99);
   CLockManager extra(kName);
-  EXPECT_EQ(FailureOf([&] { extra.LockReader(); }), SingleRead());
+  EXPECT_EQ(FailureOf([&] { extra.LockReader(); }), kSingleRead);
   OtherProcess builder(kShort, "all");
-  EXPECT_EQ(builder.Outcome(), "failed " + AllRead());
+  EXPECT_EQ(builder.Outcome(), "failed " + kAllRead);
   EXPECT_EQ(first.Release(), 0);
   EXPECT_NO_THROW(extra.LockReader());
 }
@@ -254,7 +243,7 @@ TEST_F(LockManagerTest, SameNameObjectsInOneProcess) {
   CLockManager first(kName), second(kName), third(kName);
   first.LockReader();
   second.LockReader();
-  EXPECT_EQ(FailureOf([&] { third.LockExclusive(); }), AllRead());
+  EXPECT_EQ(FailureOf([&] { third.LockExclusive(); }), kAllRead);
   EXPECT_FALSE(third.HoldsWriter());
   EXPECT_EQ(third.ReaderCount(), 0);
 
@@ -264,7 +253,7 @@ TEST_F(LockManagerTest, SameNameObjectsInOneProcess) {
             Msg("Reader lock manager already in use", "LockAllReaders"));
   EXPECT_EQ(first.ReaderCount(), 1);
   second.UnlockReaders();
-  EXPECT_EQ(FailureOf([&] { third.LockExclusive(); }), AllRead());  // first's unit is still out
+  EXPECT_EQ(FailureOf([&] { third.LockExclusive(); }), kAllRead);  // first's unit is still out
 
   first.UnlockAll();
   third.LockExclusive();
@@ -280,7 +269,7 @@ TEST_F(LockManagerTest, FailedExclusiveLockLeavesNothingHeld) {
   OtherProcess search(kShort, "reader");
   ASSERT_EQ(search.Outcome(), "held");
   CLockManager builder(kName);
-  EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), AllRead());
+  EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), kAllRead);
   {
     OtherProcess writer(kShort, "writer");
     EXPECT_EQ(writer.Outcome(), "held");
@@ -321,7 +310,7 @@ TEST_F(LockManagerTest, ReleasesAreExplicitAndSeparate) {
   close(gate[0]);
   // Giving back the readers keeps the writer.
   lock->UnlockReaders();
-  EXPECT_EQ(FailureOf([] { CLockManager(kName).LockWriter(); }), Write());
+  EXPECT_EQ(FailureOf([] { CLockManager(kName).LockWriter(); }), kWrite);
   EXPECT_NO_THROW(CLockManager(kName).LockAllReaders());
   lock->LockAllReaders();
   lock->SetName("", "orders", kLockOrder);

@@ -1,3 +1,5 @@
+// UTF-8 and UTF-16 conversion, cuts on character boundaries and simple case
+// mapping.
 #include "platform/text_encoding.h"
 
 #include <gtest/gtest.h>
@@ -8,80 +10,55 @@ namespace qm {
 namespace {
 
 const std::u16string kFffd(1, u'\xFFFD');
+const std::string kFffd8 = "\xEF\xBF\xBD";
 
-TEST(Utf8Utf16, ValidTextRoundTripsThroughEveryWidth) {
+TEST(Utf8Utf16, ValidTextRoundTripsAndInvalidTextBecomesReplacement) {
   // 1-, 2-, 3- and 4-byte sequences; the last is a surrogate pair in UTF-16.
   const std::string utf8 = "a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80z";
   const std::u16string utf16 = u"a\u00E9\u20AC\U0001F600z";
   EXPECT_EQ(Utf8ToUtf16(utf8), utf16);
   EXPECT_EQ(Utf16ToUtf8(utf16), utf8);
-}
-
-TEST(Utf8Utf16, InvalidUtf8BecomesReplacementAndKeepsWhatFollows) {
-  struct Case {
-    std::string in;
-    std::u16string out;
+  const std::pair<std::string, std::u16string> invalid[] = {
+      {"\x80", kFffd},                         // stray continuation
+      {"a\xE2\x82", u"a" + kFffd},             // sequence cut by the end
+      {"\xC3" "A", kFffd + u"A"},              // lead without continuation
+      {"\xC0\xAF", kFffd},                     // overlong "/"
+      {"\xED\xA0\x80", kFffd},                 // encoded surrogate
+      {"\xF4\x90\x80\x80", kFffd},             // above U+10FFFF
+      {"\xFF\xFE" "b", kFffd + kFffd + u"b"},  // never-valid bytes
   };
-  const Case cases[] = {
-      {"\x80", kFffd},                                    // stray continuation
-      {"a\xE2\x82", u"a" + kFffd},                        // sequence cut by the end
-      {"\xC3" "A", kFffd + u"A"},                         // lead without continuation
-      {"\xC0\xAF", kFffd},                                // overlong "/"
-      {"\xED\xA0\x80", kFffd},                            // encoded surrogate
-      {"\xF4\x90\x80\x80", kFffd},                        // above U+10FFFF
-      {"\xFF\xFE" "b", kFffd + kFffd + u"b"},             // never-valid bytes
-  };
-  for (const auto& c : cases) EXPECT_EQ(Utf8ToUtf16(c.in), c.out) << c.in;
-}
-
-TEST(Utf8Utf16, LoneSurrogatesBecomeReplacementInUtf8) {
-  const std::string fffd = "\xEF\xBF\xBD";
-  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"\xD800x")), fffd + "x");
-  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"x\xDC00")), "x" + fffd);
-  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"\xDC00\xD800")), fffd + fffd);
-}
-
-TEST(Utf8Utf16, EncodersRefuseValuesThatAreNoCharacter) {
+  for (const auto& [in, out] : invalid) EXPECT_EQ(Utf8ToUtf16(in), out) << in;
+  // Lone surrogates in UTF-16.
+  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"\xD800x")), kFffd8 + "x");
+  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"x\xDC00")), "x" + kFffd8);
+  EXPECT_EQ(Utf16ToUtf8(std::u16string(u"\xDC00\xD800")), kFffd8 + kFffd8);
+  // Encoders refuse values that are no character; decoding at the end does not move.
   std::string narrow;
   EncodeUtf8(0x110000, narrow);
   EncodeUtf8(0xD801, narrow);
-  EXPECT_EQ(narrow, "\xEF\xBF\xBD\xEF\xBF\xBD");
+  EXPECT_EQ(narrow, kFffd8 + kFffd8);
   std::u16string wide;
   EncodeUtf16(0xDFFF, wide);
   EncodeUtf16(0x7FFFFFFF, wide);
   EXPECT_EQ(wide, kFffd + kFffd);
-}
-
-TEST(Utf8Utf16, DecodeAtTheEndDoesNotMove) {
-  const std::string text = "a";
   std::size_t pos = 1;
-  EXPECT_EQ(DecodeUtf8(text, pos), char32_t{0xFFFD});
+  EXPECT_EQ(DecodeUtf8("a", pos), char32_t{0xFFFD});
   EXPECT_EQ(pos, 1u);
 }
 
-TEST(CutLength, Utf8CutNeverSplitsASequence) {
+TEST(CutLength, CutsNeverSplitACharacter) {
   const std::string text = "a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80";  // a é € 😀
   // Cut points inside a character fall back to its start.
   const std::size_t expected[] = {0, 1, 1, 3, 3, 3, 6, 6, 6, 6, 10};
-  for (std::size_t max = 0; max <= text.size(); ++max) {
-    EXPECT_EQ(Utf8CutLength(text, max), expected[max]) << max;
-  }
+  for (std::size_t max = 0; max <= text.size(); ++max) EXPECT_EQ(Utf8CutLength(text, max), expected[max]) << max;
   EXPECT_EQ(Utf8CutLength(text, 100), text.size());
-}
-
-TEST(CutLength, Utf8CutOfStrayContinuationBytesKeepsTheLimit) {
   // Bytes that belong to no character are no reason to throw the text away.
-  const std::string junk(50, '\x80');
-  EXPECT_EQ(Utf8CutLength(junk, 20), 20u);
-  EXPECT_EQ(Utf8CutLength("ab\xE2\x82\xAC", 3), 2u);
-}
+  EXPECT_EQ(Utf8CutLength(std::string(50, '\x80'), 20), 20u);
 
-TEST(CutLength, Utf16CutNeverSplitsASurrogatePair) {
-  const std::u16string text = u"a\U0001F600b";
-  EXPECT_EQ(Utf16CutLength(text, 1), 1u);
-  EXPECT_EQ(Utf16CutLength(text, 2), 1u);
-  EXPECT_EQ(Utf16CutLength(text, 3), 3u);
-  EXPECT_EQ(Utf16CutLength(text, 9), 4u);
+  const std::u16string wide = u"a\U0001F600b";
+  const std::size_t wide_expected[] = {0, 1, 1, 3, 4};
+  for (std::size_t max = 0; max <= 4; ++max) EXPECT_EQ(Utf16CutLength(wide, max), wide_expected[max]) << max;
+  EXPECT_EQ(Utf16CutLength(wide, 9), 4u);
   // A lone high surrogate is no pair: it is cut like any unit.
   EXPECT_EQ(Utf16CutLength(std::u16string(u"ab\xD800\xD800"), 3), 3u);
 }
@@ -98,19 +75,15 @@ TEST(CaseMapping, SimpleMappingPerCodePoint) {
   EXPECT_EQ(ToUpper(std::u16string_view(u"\U00010428")), u"\U00010400");
   EXPECT_EQ(ToUpperCodePoint(0x10428), char32_t{0x10400});
   EXPECT_EQ(AsciiUpper("stra\xC3\x9F" "e"), "STRA\xC3\x9F" "E");
-}
+  // Invalid UTF-8 is replaced, not looped on.
+  EXPECT_EQ(ToUpper(std::string_view("a\x80" "b")), "A" + kFffd8 + "B");
+  EXPECT_EQ(ToLower(std::string_view("\xC3")), kFffd8);
 
-TEST(CaseMapping, InPlaceUpperAgreesWithCopyingUpper) {
   const std::u16string text = u"abc \u00E9t\u00E9 \U00010428x \xD800 stra\u00DFe \u0131";
   std::u16string in_place = text;
   ToUpperInPlace(in_place);
   EXPECT_EQ(in_place, ToUpper(std::u16string_view(text)));
   EXPECT_EQ(in_place.size(), text.size());
-}
-
-TEST(CaseMapping, InvalidUtf8IsReplacedNotLooped) {
-  EXPECT_EQ(ToUpper(std::string_view("a\x80" "b")), "A\xEF\xBF\xBD" "B");
-  EXPECT_EQ(ToLower(std::string_view("\xC3")), "\xEF\xBF\xBD");
 }
 
 }  // namespace

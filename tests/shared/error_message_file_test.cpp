@@ -1,11 +1,10 @@
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <map>
-#include <optional>
+#include <memory>
 #include <string>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/error_messages.h"
 
 namespace qm {
@@ -67,41 +66,25 @@ TEST(ErrorMessageFile, LongTextsAreCutAndOddInputSurvives) {
   EXPECT_TRUE(ParseErrorMessages("\xFF\xFE").empty());
 }
 
-class ErrorMessageLoading : public ::testing::Test {
- protected:
-  void TearDown() override {
-    if (saved_system_) {
-      setenv("MORVIL_SYSTEM", saved_system_->c_str(), 1);
-    } else {
-      unsetenv("MORVIL_SYSTEM");
-    }
-    LoadErrorMessages();
-  }
-  std::optional<std::string> saved_system_ =
-      std::getenv("MORVIL_SYSTEM") ? std::optional<std::string>(std::getenv("MORVIL_SYSTEM"))
-                                   : std::nullopt;
-  test::ScratchDir dir_;
-};
-
-TEST_F(ErrorMessageLoading, ReadsTheSystemFolderFile) {
-  test::WriteFile(dir_.Path() + "mrvconf.ini",
+TEST(ErrorMessageLoading, ReadsTheSystemFolderFileAndAMissingFileLeavesTheTableEmpty) {
+  auto home = std::make_unique<test::ConfiguredHome>();  // restores MORVIL_SYSTEM when it goes
+  test::WriteFile(home->Home() + "System/mrvconf.ini",
                   test::Utf16LeFile(u"[ERROR MESSAGES]\r\n44,60,Findex %s is in use\r\n"));
   // The configured folder may lack its final "/".
-  const std::string folder = dir_.Path().substr(0, dir_.Path().size() - 1);
-  setenv("MORVIL_SYSTEM", folder.c_str(), 1);
-  EXPECT_EQ(ErrorMessageFolder(), dir_.Path());
+  setenv("MORVIL_SYSTEM", (home->Home() + "System").c_str(), 1);
+  EXPECT_EQ(ErrorMessageFolder(), home->Home() + "System/");
   LoadErrorMessages();
-  const ErrorEntry e = LookupErrorMessage(44);
+  ErrorEntry e = LookupErrorMessage(44);
   EXPECT_EQ(e.text, u"Findex %s is in use");
   EXPECT_EQ(e.level, 60);
-}
 
-TEST_F(ErrorMessageLoading, AMissingFileLeavesTheTableEmpty) {
-  EXPECT_FALSE(LoadErrorMessagesFromFile(dir_.Path() + "absent.ini"));
-  const ErrorEntry e = LookupErrorMessage(44);
+  EXPECT_FALSE(LoadErrorMessagesFromFile(home->Home() + "absent.ini"));
+  e = LookupErrorMessage(44);
   EXPECT_EQ(e.text, u"General Error (Module:%MODULE, Method:%METHOD)");
   EXPECT_EQ(e.level, 200);
   EXPECT_EQ(e.number, 44);
+  home.reset();
+  LoadErrorMessages();
 }
 
 }  // namespace

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/error_messages.h"
 #include "shared/exception_family.h"
 
@@ -14,40 +14,29 @@ namespace qm {
 namespace {
 
 using test::EntryTexts;
-using test::ThrownTexts;
+using test::RaisedChain;
 using Texts = std::vector<std::string>;
 
 const std::string kUnknown =
     "Unknown exception. This is a critical error, please report this problem to Morvil support";
 
-template <class... E>
-std::vector<std::string> GeneralTexts() {
-  return {test::EntryTexts(E::General(nullptr)).at(0)...};
-}
+// Each class names the module its own name carries.
+#define QM_EXPECT_MODULE(M) \
+  EXPECT_EQ(EntryTexts(C##M##Exception::General(nullptr)), Texts{"General Error (Module:" #M ")"});
 
 TEST(ExceptionFamily, EveryModuleNamesItselfInItsGeneralError) {
-  const std::vector<std::string> texts = GeneralTexts<
-      CStreamException, CECComClientException, CSyncServersException, CPiStartPointException,
-      CPiCmdException, CHighStructuresException, CPiFIndexException, CPiOrderException,
-      CWinFileException, CPiDeleteException, CPiSortException, CPiOrderSortException,
-      CValueException, CSTDFUNException, CCollectionException, CShareDatabaseException,
-      CStringFuncUException, CBFileException, CMFileException, CFreeItemException,
-      CBlockException, CGiStartPointException, CGiTreeRowsetException, CGiCmdTreeException,
-      CGiFIndexException, CGiRepositoryException, CGiOrderException, CShareRepositoryException,
-      CShareCollectorException, CShareDefinitionException, CLanguageException,
-      CDocConverterException, CComConverterException, CConnectionException, CConverterException,
-      CLockManagerException>();
-  const char* modules[] = {
-      "Stream", "ECComClient", "SyncServers", "PiStartPoint", "PiCmd", "HighStructures",
-      "PiFIndex", "PiOrder", "WinFile", "PiDelete", "PiSort", "PiOrderSort", "Value", "STDFUN",
-      "Collection", "ShareDatabase", "StringFuncU", "BFile", "MFile", "FreeItem", "Block",
-      "GiStartPoint", "GiTreeRowset", "GiCmdTree", "GiFIndex", "GiRepository", "GiOrder",
-      "ShareRepository", "ShareCollector", "ShareDefinition", "Language", "DocConverter",
-      "ComConverter", "Connection", "Converter", "LockManager"};
-  ASSERT_EQ(texts.size(), std::size(modules));
-  for (std::size_t i = 0; i < texts.size(); ++i) {
-    EXPECT_EQ(texts[i], "General Error (Module:" + std::string(modules[i]) + ")");
-  }
+  QM_EXPECT_MODULE(Stream) QM_EXPECT_MODULE(ECComClient) QM_EXPECT_MODULE(SyncServers)
+  QM_EXPECT_MODULE(PiStartPoint) QM_EXPECT_MODULE(PiCmd) QM_EXPECT_MODULE(HighStructures)
+  QM_EXPECT_MODULE(PiFIndex) QM_EXPECT_MODULE(PiOrder) QM_EXPECT_MODULE(WinFile)
+  QM_EXPECT_MODULE(PiDelete) QM_EXPECT_MODULE(PiSort) QM_EXPECT_MODULE(PiOrderSort)
+  QM_EXPECT_MODULE(Value) QM_EXPECT_MODULE(STDFUN) QM_EXPECT_MODULE(Collection)
+  QM_EXPECT_MODULE(ShareDatabase) QM_EXPECT_MODULE(StringFuncU) QM_EXPECT_MODULE(BFile)
+  QM_EXPECT_MODULE(MFile) QM_EXPECT_MODULE(FreeItem) QM_EXPECT_MODULE(Block)
+  QM_EXPECT_MODULE(GiStartPoint) QM_EXPECT_MODULE(GiTreeRowset) QM_EXPECT_MODULE(GiCmdTree)
+  QM_EXPECT_MODULE(GiFIndex) QM_EXPECT_MODULE(GiRepository) QM_EXPECT_MODULE(GiOrder)
+  QM_EXPECT_MODULE(ShareRepository) QM_EXPECT_MODULE(ShareCollector) QM_EXPECT_MODULE(ShareDefinition)
+  QM_EXPECT_MODULE(Language) QM_EXPECT_MODULE(DocConverter) QM_EXPECT_MODULE(ComConverter)
+  QM_EXPECT_MODULE(Connection) QM_EXPECT_MODULE(Converter) QM_EXPECT_MODULE(LockManager)
 }
 
 // Builds one unknown exception of each class and returns the trace areas expected.
@@ -99,9 +88,8 @@ TEST(ExceptionFamily, UnknownExceptionsTraceUnderTheirTags) {
   EXPECT_EQ(replib.find("MFile"), std::string::npos);
 }
 
-TEST(ExceptionForms, GeneralErrorWithAndWithoutMethod) {
+TEST(ExceptionForms, GeneralAndTextErrors) {
   const auto e = CSTDFUNException::General(nullptr);
-  ASSERT_EQ(e.GetEntries().size(), 1u);
   EXPECT_EQ(EntryTexts(e), Texts{"General Error (Module:STDFUN)"});
   EXPECT_EQ(e.GetEntries()[0].level, 200);
   EXPECT_EQ(e.GetEntries()[0].number, 1);
@@ -109,15 +97,13 @@ TEST(ExceptionForms, GeneralErrorWithAndWithoutMethod) {
   EXPECT_TRUE(e.GetCurrentEntry().text.empty());
   EXPECT_EQ(EntryTexts(CBlockException::General("ReadInt")),
             Texts{"General Error (Module:Block,Method:ReadInt)"});
-}
 
-TEST(ExceptionForms, TextErrorFormatsItsArguments) {
-  const auto e = CSTDFUNException::Text("Error deleting file: %S", "DropFile", nullptr,
+  const auto t = CSTDFUNException::Text("Error deleting file: %S", "DropFile", nullptr,
                                         std::string("/data/a b.sdx"));
-  EXPECT_EQ(EntryTexts(e), Texts{"Error deleting file: /data/a b.sdx (Module:STDFUN,Method:DropFile)"});
-  EXPECT_EQ(e.GetEntries()[0].level, 100);
-  EXPECT_EQ(e.GetCurrentEntry().text, e.GetEntries()[0].text);
-  EXPECT_EQ(e.GetErrorNumber(), 1);
+  EXPECT_EQ(EntryTexts(t), Texts{"Error deleting file: /data/a b.sdx (Module:STDFUN,Method:DropFile)"});
+  EXPECT_EQ(t.GetEntries()[0].level, 100);
+  EXPECT_EQ(t.GetCurrentEntry().text, t.GetEntries()[0].text);
+  EXPECT_EQ(t.GetErrorNumber(), 1);
   // Wide text, a wide argument and directives that data cannot trigger.
   const auto w = CPiCmdException::Text(u"Bad word %s at %i", "TranslateW", nullptr,
                                        std::u16string(u"%s%n"), 3);
@@ -141,7 +127,7 @@ class NumberedErrors : public ::testing::Test {
   test::ScratchDir dir_;
 };
 
-TEST_F(NumberedErrors, TakeTextAndLevelFromTheTable) {
+TEST_F(NumberedErrors, TakeTextAndLevelFromTheTableOrTheDefaultAtLevel200) {
   const auto e = CPiCmdException::Numbered(13, "TranslateW", nullptr, "near X");
   EXPECT_EQ(EntryTexts(e), Texts{"Statement error in TranslateW of PiCmd: near X %MODULE"});
   EXPECT_EQ(e.GetEntries()[0].level, 50);
@@ -150,17 +136,12 @@ TEST_F(NumberedErrors, TakeTextAndLevelFromTheTable) {
   // Without a method the placeholder stays.
   EXPECT_EQ(EntryTexts(CPiCmdException::Numbered(13, nullptr, nullptr)),
             Texts{"Statement error in %METHOD of PiCmd: %s %MODULE"});
-}
 
-TEST_F(NumberedErrors, MissingNumberGetsTheDefaultTextAtLevel200) {
-  const auto e = CGiTreeRowsetException::Numbered(59, "SetOrder", nullptr);
-  EXPECT_EQ(EntryTexts(e), Texts{"General Error (Module:GiTreeRowset, Method:SetOrder)"});
-  EXPECT_EQ(e.GetEntries()[0].level, 200);
-  EXPECT_EQ(e.GetErrorNumber(), 59);
-  EXPECT_EQ(e.GetFullTextUtf8(100), "General Error (Module:GiTreeRowset, Method:SetOrder)\r\n");
-}
+  const auto missing = CGiTreeRowsetException::Numbered(59, "SetOrder", nullptr);
+  EXPECT_EQ(missing.GetEntries()[0].level, 200);
+  EXPECT_EQ(missing.GetErrorNumber(), 59);
+  EXPECT_EQ(missing.GetFullTextUtf8(100), "General Error (Module:GiTreeRowset, Method:SetOrder)\r\n");
 
-TEST_F(NumberedErrors, FullTextFallsBackToEveryEntry) {
   // Only entries above level 200: nothing at 100 or 200, so all of them.
   const auto inner = CPiCmdException::Numbered(40, "ExecuteW", nullptr);
   const auto outer = CPiCmdException::Numbered(40, "ExecuteW", &inner);
@@ -193,7 +174,8 @@ TEST(ExceptionChain, InnerEntriesFollowTheNewOne) {
 }
 
 TEST(ExceptionChain, FamiliesAreDistinctTypes) {
-  auto which = [](auto thrower) -> std::string {
+  test::ConfiguredHome home;
+  const auto which = [](auto thrower) -> std::string {
     try {
       thrower();
     } catch (const CBlockException&) {
@@ -205,12 +187,10 @@ TEST(ExceptionChain, FamiliesAreDistinctTypes) {
     }
     return "none";
   };
-  EXPECT_EQ(which([] { throw CBlockException::General("A"); }), "block");
-  EXPECT_EQ(which([] { throw CBFileException::General("A"); }), "exception");
-  EXPECT_EQ(which([] { throw CShareDatabaseWarning::Text("No data", "Fetch", nullptr); }),
-            "exception");
-  test::ConfiguredHome home;
-  EXPECT_EQ(which([] { throw CMFileUnknownException::Unknown("A"); }), "unknown");
+  EXPECT_EQ(which([] { throw CBlockException::General("A"); }) + which([] { throw CBFileException::General("A"); }) +
+                which([] { throw CShareDatabaseWarning::Text("No data", "Fetch", nullptr); }) +
+                which([] { throw CMFileUnknownException::Unknown("A"); }),
+            "blockexceptionexceptionunknown");
 }
 
 TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {
@@ -218,41 +198,38 @@ TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {
   using G = CPiCmdException;
   using GU = CPiCmdUnknownException;
   EXPECT_EQ((Guard<G, GU>("ExecuteW", [] { return 42; })), 42);
-  EXPECT_EQ(ThrownTexts<G>([] {
+  EXPECT_EQ(RaisedChain<G>([] {
               Guard<G, GU>("ExecuteW", [] { throw G::Text("Own", "TranslateW", nullptr); });
             }),
             Texts{"Own (Module:PiCmd,Method:TranslateW)"});
-  EXPECT_EQ(ThrownTexts<G>([] {
+  EXPECT_EQ(RaisedChain<G>([] {
               Guard<G, GU>("ExecuteW", [] { throw CBlockException::Text("Cause", "Read", nullptr); });
             }),
             (Texts{"General Error (Module:PiCmd,Method:ExecuteW)", "Cause (Module:Block,Method:Read)"}));
   // Anything else, an unknown exception from below included, becomes this
   // module's unknown exception with no inner entries.
-  EXPECT_EQ(ThrownTexts<GU>([] {
+  EXPECT_EQ(RaisedChain<GU>([] {
               Guard<G, GU>("ExecuteW", [] { throw std::runtime_error("boom"); });
             }),
             Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
-  EXPECT_EQ(ThrownTexts<GU>([] {
+  EXPECT_EQ(RaisedChain<GU>([] {
               Guard<G, GU>("ExecuteW", [] { throw CMFileUnknownException::Unknown("Read"); });
             }),
             Texts{kUnknown + " (Module:PiCmd,Method:ExecuteW)"});
   EXPECT_NE(test::TraceOf(home, "PILIB").find(
                 " PiCmdUnknownException - *** UNKNOWN EXCEPTION *** (Method:ExecuteW)\r\n"),
             std::string::npos);
-}
-
-TEST(Guard, ModulesWithoutUnknownClassPassForeignExceptions) {
-  test::ConfiguredHome home;
+  // A module without an unknown-exception class passes foreign exceptions on unchanged.
   EXPECT_THROW((Guard<CBlockException>("Read", [] { throw std::runtime_error("x"); })),
                std::runtime_error);
-  EXPECT_EQ(ThrownTexts<CMFileUnknownException>([] {
+  EXPECT_EQ(RaisedChain<CMFileUnknownException>([] {
               Guard<CBlockException>("Read", [] { throw CMFileUnknownException::Unknown("Get"); });
             }),
             Texts{kUnknown + " (Module:MFile,Method:Get)"});
 }
 
 TEST(Guard, AnErrorCollectsOneGeneralEntryPerBoundary) {
-  const auto texts = ThrownTexts<CPiStartPointException>([] {
+  const auto texts = RaisedChain<CPiStartPointException>([] {
     Guard<CPiStartPointException, CPiStartPointUnknownException>("ExecuteW", [] {
       Guard<CPiFIndexException, CPiFIndexUnknownException>("BuildRowFindex", [] {
         Guard<CBlockException>("InsertRow", [] {

@@ -98,25 +98,7 @@ TEST_F(MFileTest, TruncateDropsPendingAndOldBytesAndLeavesTheFileThere) {
   EXPECT_EQ(f.FileSize(), 0);
 }
 
-TEST_F(MFileTest, EndOfFile) {
-  std::string content;
-  for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 23));
-  test::WriteFile(Path("e"), content);
-  MFile f;
-  f.OpenFile(Path("e"), MFile::kReadOnly);
-  std::string got(11996, '\0');
-  ASSERT_EQ(f.mread(got.data(), got.size()), got.size());  // across refills
-  EXPECT_EQ(got, content.substr(0, got.size()));
-  char rest[10];
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(rest, 10); }),
-            "EOF error reading from disk (Module:MFile,Method:mread)");
-  EXPECT_TRUE(f.IsEOF());
-  EXPECT_EQ(f.mread(rest, 1), 0u);
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mrefill(false); }),
-            "EOF error reading from disk (Module:MFile,Method:mread)");
-}
-
-TEST_F(MFileTest, LargeReadsAfterBufferedOnesKeepBytesAndPosition) {
+TEST_F(MFileTest, LargeReadsAfterBufferedOnesKeepBytesAndPositionUpToTheEnd) {
   std::string content;
   for (int i = 0; i < 12000; ++i) content.push_back(static_cast<char>('a' + i % 23));
   test::WriteFile(Path("l"), content);
@@ -136,19 +118,22 @@ TEST_F(MFileTest, LargeReadsAfterBufferedOnesKeepBytesAndPosition) {
   ASSERT_EQ(f.mread(got.data(), got.size()), got.size());
   EXPECT_EQ(got, content.substr(6102));
   EXPECT_EQ(f.mread(got.data(), got.size()), 0u) << "nothing left at all";
-  // A large read that finds the end in its middle fails.
+  const std::string eof = "EOF error reading from disk (Module:MFile,Method:mread)";
+  // A large read that finds the end in its middle fails, and so does a small one.
   f.Seek(7000);
-  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(got.data(), got.size()); }),
-            "EOF error reading from disk (Module:MFile,Method:mread)");
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(got.data(), got.size()); }), eof);
+  f.Seek(11996);
+  char rest[10];
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mread(rest, 10); }), eof);
+  EXPECT_TRUE(f.IsEOF());
+  EXPECT_EQ(f.mread(rest, 1), 0u);
+  EXPECT_EQ(RaisedText<CMFileException>([&] { f.mrefill(false); }), eof);
 }
 
 TEST_F(MFileTest, TypedItemsRoundTripInTheirByteLayout) {
   const DateTimeValue date{2004, 3, 9, 14, 5, 7, 123456};
-  CValue text, wide, number, when;
-  text.SetText("naïve");
-  wide.SetTextW(u"w\u00fc");
-  number.SetInteger(-42);
-  when.SetDateTime(date);
+  const CValue text = test::Value("naïve"), wide = test::Value(u"w\u00fc"), number = test::Value(-42),
+               when = test::Value(date);
   const int32_t row[] = {7, -8};
   MFile f;
   f.OpenFile(Path("t"), MFile::kCreate);
@@ -215,10 +200,8 @@ TEST_F(MFileTest, ReadsThatFindNothingNameThemselves) {
 TEST_F(MFileTest, StringLengthsOutsideTheShortFieldAreRefused) {
   MFile f;
   f.OpenFile(Path("l"), MFile::kCreate);
-  CValue longest, too_long, too_long_wide;
-  longest.SetText(std::string(32767, 'x'));
-  too_long.SetText(std::string(32768, 'x'));
-  too_long_wide.SetTextW(std::u16string(32768, u'x'));
+  const CValue longest = test::Value(std::string(32767, 'x')), too_long = test::Value(std::string(32768, 'x')),
+               too_long_wide = test::Value(std::u16string(32768, u'x'));
   f.WriteValue(longest);
   const std::string refused = "Fatal error writting len to file (Module:MFile,Method:";
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.WriteValue(too_long); }), refused + "WriteValue)");
@@ -249,17 +232,10 @@ TEST_F(MFileTest, FailedDiskWritesNameTheStepAndKeepTheCause) {
   const std::string big(6000, 'b');
   EXPECT_EQ(RaisedText<CMFileException>([&] { f.mwrite(big.data(), big.size()); }),
             "OS error writing 6000 bytes to disk (Module:MFile,Method:mwrite)");
-  std::vector<std::pair<CValue, std::string>> cases(5);
-  cases[0].first.SetInteger(1);
-  cases[0].second = "int";
-  cases[1].first.SetDouble(1.5);
-  cases[1].second = "double";
-  cases[2].first.SetDateTime({2001, 1, 1, 0, 0, 0, 0});
-  cases[2].second = "date";
-  cases[3].first.SetText("ab");
-  cases[3].second = "len";
-  cases[4].first.SetText(big);
-  cases[4].second = "string";
+  const std::pair<CValue, std::string> cases[] = {
+      {test::Value(1), "int"}, {test::Value(1.5), "double"},
+      {test::Value(DateTimeValue{2001, 1, 1, 0, 0, 0, 0}), "date"}, {test::Value("ab"), "len"},
+      {test::Value(big), "string"}};
   for (const auto& [value, what] : cases) {
     // A nearly full buffer makes the failing write commit it.
     const std::string filler(what == "string" ? 4998 : 4999, 'f');

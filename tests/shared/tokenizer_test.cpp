@@ -1,3 +1,4 @@
+// The narrow tokenizers, blank trims and quote removal.
 #include "shared/tokenizer.h"
 
 #include <gtest/gtest.h>
@@ -5,56 +6,49 @@
 #include <string>
 #include <vector>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/exception_family.h"
 
 namespace qm {
 namespace {
 
-// Every token GetToken hands out, and what is left of the source.
-std::vector<std::string> AllTokens(std::string source, char delimiter, bool drop_hash,
-                                   std::string* rest = nullptr) {
-  std::vector<std::string> tokens;
+using Tokens = std::vector<std::string>;
+
+// Every token GetToken hands out, then "|" and what is left of the source.
+Tokens AllTokens(std::string source, char delimiter, bool drop_hash) {
+  Tokens tokens;
   std::string token;
   while (GetToken(source, token, delimiter, drop_hash)) tokens.push_back(token);
   EXPECT_EQ(token, "");  // the failing call hands out nothing
-  if (rest != nullptr) *rest = source;
+  tokens.push_back("|" + source);
   return tokens;
 }
 
-using Tokens = std::vector<std::string>;
-
-TEST(GetToken, DoubledQuoteGivesOneQuote) {
-  std::string rest;
-  EXPECT_EQ(AllTokens("a\"\"b,", ',', false, &rest), Tokens{"a\"b"});
-  EXPECT_EQ(rest, "");
+TEST(GetToken, DelimitersQuotesAndHashes) {
+  struct Case {
+    const char* source;
+    char delimiter;
+    bool drop_hash;
+    Tokens expected;
+  };
+  const Case cases[] = {
+      {"a\"\"b,", ',', false, {"a\"b", "|"}},  // a doubled quote gives one quote
+      // Leading delimiters are skipped; the last token needs a delimiter after it.
+      {",,x,,y,z", ',', false, {"x", "y", "|z"}},
+      // Quotes protect delimiters and are kept; an unterminated one swallows the rest.
+      {"\"a,b\",c,", ',', false, {"\"a,b\"", "c", "|"}},
+      {"\"a b\" \"c\"\"d\" ", ' ', false, {"\"a b\"", "\"c\"d\"", "|"}},
+      {"\"a,b,", ',', false, {"|\"a,b,"}},
+      // "#" quotes dates and may be dropped; inside double quotes it is plain text.
+      {"#1/2/03, 10:00#,x,", ',', true, {"1/2/03, 10:00", "x", "|"}},
+      {"#1/2/03, 10:00#,x,", ',', false, {"#1/2/03, 10:00#", "x", "|"}},
+      {"\"#\",x,", ',', true, {"\"#\"", "x", "|"}},
+      {"\xC3\xA9t\xC3\xA9,\xFF,", ',', false, {"\xC3\xA9t\xC3\xA9", "\xFF", "|"}},
+  };
+  for (const Case& c : cases) EXPECT_EQ(AllTokens(c.source, c.delimiter, c.drop_hash), c.expected) << c.source;
 }
 
-TEST(GetToken, LeadingDelimitersAreSkippedAndTheLastTokenNeedsADelimiter) {
-  std::string rest;
-  EXPECT_EQ(AllTokens(",,x,,y,z", ',', false, &rest), (Tokens{"x", "y"}));
-  EXPECT_EQ(rest, "z");  // no delimiter after it: no token, source left as it was
-}
-
-TEST(GetToken, QuotesProtectDelimitersAndAreKept) {
-  EXPECT_EQ(AllTokens("\"a,b\",c,", ',', false), (Tokens{"\"a,b\"", "c"}));
-  EXPECT_EQ(AllTokens("\"a b\" \"c\"\"d\" ", ' ', false), (Tokens{"\"a b\"", "\"c\"d\""}));
-  // An unterminated quote swallows the final delimiter.
-  EXPECT_EQ(AllTokens("\"a,b,", ',', false), Tokens{});
-}
-
-TEST(GetToken, HashQuotesDatesAndMayBeDropped) {
-  EXPECT_EQ(AllTokens("#1/2/03, 10:00#,x,", ',', true), (Tokens{"1/2/03, 10:00", "x"}));
-  EXPECT_EQ(AllTokens("#1/2/03, 10:00#,x,", ',', false), (Tokens{"#1/2/03, 10:00#", "x"}));
-  // Inside double quotes "#" is plain text.
-  EXPECT_EQ(AllTokens("\"#\",x,", ',', true), (Tokens{"\"#\"", "x"}));
-}
-
-TEST(GetToken, BytesAboveAsciiPassThrough) {
-  EXPECT_EQ(AllTokens("\xC3\xA9t\xC3\xA9,\xFF,", ',', false), (Tokens{"\xC3\xA9t\xC3\xA9", "\xFF"}));
-}
-
-TEST(GetTokenBySet, ReturnsEachDelimiterAndMinusOneAtTheEnd) {
+TEST(GetTokenBySet, ReturnsEachDelimiterUnsignedAndMinusOneAtTheEnd) {
   std::string source = " ,a b,c";
   std::string token;
   EXPECT_EQ(GetTokenBySet(source, token, " ,"), ' ');
@@ -65,41 +59,29 @@ TEST(GetTokenBySet, ReturnsEachDelimiterAndMinusOneAtTheEnd) {
   EXPECT_EQ(GetTokenBySet(source, token, " ,"), -1);
   EXPECT_EQ(token, "c");
   EXPECT_EQ(source, "");
-
   source = ",,,";
   EXPECT_EQ(GetTokenBySet(source, token, ","), -1);
   EXPECT_EQ(token, "");
   EXPECT_EQ(source, "");
-}
-
-TEST(GetTokenBySet, ByteDelimitersAreUnsigned) {
-  std::string source = "a\xA7" "b";
-  std::string token;
+  source = "a\xA7" "b";
   EXPECT_EQ(GetTokenBySet(source, token, "\xA7"), 0xA7);
   EXPECT_EQ(token, "a");
 }
 
-TEST(Trim, BlanksOnOneSide) {
-  std::string left = "   a b  ";
+TEST(Trim, BlanksOnOneSideUpTo1999Characters) {
+  std::string left = "   a b  ", right = left, blank = "    ";
   STrimLeft(left);
-  EXPECT_EQ(left, "a b  ");
-  std::string right = "   a b  ";
   STrimRight(right);
-  EXPECT_EQ(right, "   a b");
-  std::string blank = "    ";
   STrimRight(blank);
-  EXPECT_EQ(blank, "");
-}
-
-TEST(Trim, MoreThan1999CharactersIsTooLong) {
+  EXPECT_EQ(left + "|" + right + "|" + blank, "a b  |   a b|");
   std::string ok = " " + std::string(1998, 'x');
   STrimLeft(ok);
   EXPECT_EQ(ok.size(), 1998u);
   std::string too_long(2000, ' ');
-  EXPECT_EQ(test::ThrownTexts<CSTDFUNException>([&] { STrimLeft(too_long); }),
-            std::vector<std::string>{"String too long (Module:STDFUN,Method:STrimLeft)"});
-  EXPECT_EQ(test::ThrownTexts<CSTDFUNException>([&] { STrimRight(too_long); }),
-            std::vector<std::string>{"String too long (Module:STDFUN,Method:STrimRight)"});
+  EXPECT_EQ(test::RaisedText<CSTDFUNException>([&] { STrimLeft(too_long); }),
+            "String too long (Module:STDFUN,Method:STrimLeft)");
+  EXPECT_EQ(test::RaisedText<CSTDFUNException>([&] { STrimRight(too_long); }),
+            "String too long (Module:STDFUN,Method:STrimRight)");
   EXPECT_EQ(too_long.size(), 2000u);
 }
 
@@ -107,16 +89,12 @@ TEST(QuoteRemoval, RemoveEveryQuoteOrTrimAndCollapse) {
   std::string all = "a\"b\"\"c\"";
   RemoveQuotes(all);
   EXPECT_EQ(all, "abc");
-
-  std::string dsn = "\"a \"\"b\"\" c\"";
-  TrimQuotes(dsn);
-  EXPECT_EQ(dsn, "a \"b\" c");
-  std::string only = "\"\"\"\"";
-  TrimQuotes(only);
-  EXPECT_EQ(only, "");
-  std::string inner = "x\"\"\"\"y";  // two pairs collapse to two quotes
-  TrimQuotes(inner);
-  EXPECT_EQ(inner, "x\"\"y");
+  const std::pair<std::string, std::string> trims[] = {
+      {"\"a \"\"b\"\" c\"", "a \"b\" c"}, {"\"\"\"\"", ""}, {"x\"\"\"\"y", "x\"\"y"}};
+  for (auto [text, expected] : trims) {
+    TrimQuotes(text);
+    EXPECT_EQ(text, expected);
+  }
 }
 
 }  // namespace

@@ -9,7 +9,7 @@
 #include <thread>
 #include <vector>
 
-#include "shared/core_test_support.h"
+#include "file_test_util.h"
 #include "shared/exception_family.h"
 
 namespace qm {
@@ -29,12 +29,7 @@ const std::string kStamp = R"(\d{4}-[1-9]\d?-[1-9]\d? (0|[1-9]\d?):(0|[1-9]\d?):
 
 TEST(TraceLineFormat, NoLeadingZerosAndOptionalArea) {
   std::tm t{};
-  t.tm_year = 2004 - 1900;
-  t.tm_mon = 2;
-  t.tm_mday = 9;
-  t.tm_hour = 14;
-  t.tm_min = 5;
-  t.tm_sec = 7;
+  t.tm_year = 2004 - 1900, t.tm_mon = 2, t.tm_mday = 9, t.tm_hour = 14, t.tm_min = 5, t.tm_sec = 7;
   EXPECT_EQ(TraceDate(t), "2004-3-9");
   EXPECT_EQ(TraceLine(t, "Block.InsertRow", "Error inserting row"),
             "2004-3-9 14:5:7 Block.InsertRow - Error inserting row\r\n");
@@ -42,8 +37,12 @@ TEST(TraceLineFormat, NoLeadingZerosAndOptionalArea) {
   EXPECT_EQ(TraceLine(t, "", "text"), "2004-3-9 0:0:0  - text\r\n");
 }
 
-TEST(TraceFiles, OneFilePerModuleAndDay) {
+TEST(TraceFiles, OneFilePerModuleAndDayWithMessagesCutAt1023Bytes) {
   test::ConfiguredHome home;
+  Trace(true, "LONG.A", "%s", std::string(5000, 'x'));
+  const std::string line = test::TraceOf(home, "LONG");
+  EXPECT_NE(line.find(" A - " + std::string(1023, 'x') + "\r\n"), std::string::npos);
+  EXPECT_EQ(line.find(std::string(1024, 'x')), std::string::npos);
   Trace(true, "SHARELIB_ERROR.Block.InsertRow", "Error inserting row");
   Trace(true, "SHARELIB,PILIB.cmd.TranslateW", "Translating. Statement: %s, Words: %i", "SELECT %s",
         3);
@@ -60,14 +59,6 @@ TEST(TraceFiles, OneFilePerModuleAndDay) {
   EXPECT_TRUE(std::regex_match(test::TraceOf(home, "PILIB"), translating));
   EXPECT_TRUE(std::regex_match(test::TraceOf(home, "APICommand"),
                                std::regex(kStamp + "  - Failure \xC3\xA9\r\n")));
-}
-
-TEST(TraceFiles, MessagesAreCutAt1023Bytes) {
-  test::ConfiguredHome home;
-  Trace(true, "LONG.A", "%s", std::string(5000, 'x'));
-  const std::string line = test::TraceOf(home, "LONG");
-  EXPECT_NE(line.find(" A - " + std::string(1023, 'x') + "\r\n"), std::string::npos);
-  EXPECT_EQ(line.find(std::string(1024, 'x')), std::string::npos);
 }
 
 class TraceRollOver : public ::testing::Test {

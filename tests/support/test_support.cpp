@@ -50,7 +50,7 @@ ConfiguredHome::ConfiguredHome() : dir_("home") {
   data_ = dir_.Path() + "data/";
   for (const char* sub : {"Log", "Config", "System", "Tasks"}) fs::create_directories(home_ + sub);
   fs::create_directories(data_);
-  for (const char* name : {"MORVIL_HOME", "MORVIL_PATH", "MORVIL_REGISTRY"}) {
+  for (const char* name : {"MORVIL_HOME", "MORVIL_PATH", "MORVIL_REGISTRY", "MORVIL_SYSTEM"}) {
     const char* old = std::getenv(name);
     saved_.emplace_back(name, old ? std::optional<std::string>(old) : std::nullopt);
   }

@@ -16,10 +16,6 @@
 namespace qm::test {
 namespace {
 
-bool Contains(const std::string& text, const std::string& part) {
-  return text.find(part) != std::string::npos;
-}
-
 std::string N(CLanguage& language, const std::u16string& word) {
   return Utf16ToUtf8(language.Normalise(std::u16string_view(word)));
 }
@@ -39,12 +35,15 @@ TEST(Language, EveryShippedLanguageLoadsWithItsSteps) {
   EXPECT_EQ(language.GetOptions(), CLanguage::kUseStopWords | CLanguage::kUseCharacterTranslation);
 }
 
-TEST(Language, ShippedStopWordsAreUpperCasedOnLoad) {
+TEST(Language, ShippedStopWordsAreUpperCasedAndTestedOnTheWordAsCut) {
   CLanguage language(ShippedLanguageFolder());
-  language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords);
+  language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords | CLanguage::kUseStemming);
   EXPECT_TRUE(language.IsStopWord(u"THE"));
   EXPECT_FALSE(language.IsStopWord(u"the"));
-  EXPECT_FALSE(language.IsStopWord(u"RIVER"));
+  // OWNED is no stop word, so it is kept, though its stem OWN is one.
+  EXPECT_FALSE(language.IsStopWord(u"OWNED"));
+  EXPECT_EQ(N(language, u"OWNED"), "OWN");
+  EXPECT_TRUE(language.IsStopWord(u"OWN"));
   language.LoadLanguage(lngRussian, CLanguage::kUseStopWords);
   EXPECT_TRUE(language.IsStopWord(u"И"));
   EXPECT_TRUE(language.IsStopWord(u"ЧТОБЫ"));
@@ -52,34 +51,32 @@ TEST(Language, ShippedStopWordsAreUpperCasedOnLoad) {
   EXPECT_FALSE(language.IsStopWord(u"И"));  // stop words off
 }
 
-TEST(Language, UnknownLanguagesAreRefused) {
+TEST(Language, UnknownLanguagesAndStepsOtherLanguagesCannotTakeAreRefused) {
   CLanguage language(ShippedLanguageFolder());
   language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords);
-  for (const int32_t id : {0, 13, -1}) {
-    const std::string text = FailureText([&] { language.LoadLanguage(id, 0); });
-    EXPECT_TRUE(Contains(text, "Unknown language " + std::to_string(id) +
-                                   " (Module:Language,Method:LoadLanguage)"))
-        << text;
+  const std::pair<int32_t, std::string> refused[] = {
+      {0, "Unknown language 0 (Module:Language,Method:LoadLanguage)"},
+      {13, "Unknown language 13 (Module:Language,Method:LoadLanguage)"},
+      {-1, "Unknown language -1 (Module:Language,Method:LoadLanguage)"}};
+  for (const auto& [id, text] : refused) {
+    EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(id, 0); }), text)) << id;
     EXPECT_FALSE(language.IsLoaded());
     EXPECT_FALSE(language.IsStopWord(u"THE"));
   }
-}
-
-TEST(Language, OtherLanguageRefusesStemmingPhoneticAndAccents) {
-  CLanguage language(ShippedLanguageFolder());
-  EXPECT_TRUE(Contains(
-      FailureText([&] { language.LoadLanguage(lngOther, false, true, false, false, false); }),
-      "Stemming is only supported for specific languages, not for other languages "
-      "(Module:Language,Method:InitializeStemming)"));
-  EXPECT_TRUE(Contains(
-      FailureText([&] { language.LoadLanguage(lngOther, false, false, true, false, false); }),
-      "Phonetic search is only supported for specific languages, not for other languages "
-      "(Module:Language,Method:InitializePhonetic)"));
-  EXPECT_TRUE(Contains(
-      FailureText([&] { language.LoadLanguage(lngOther, false, false, false, true, false); }),
-      "Accents can only be removed for specific languages, not for other languages. Use "
-      "custom character translation instead. (Module:Language,Method:LoadLanguage)"));
-  EXPECT_FALSE(language.IsLoaded());
+  const std::pair<int32_t, std::string> other[] = {
+      {CLanguage::kUseStemming,
+       "Stemming is only supported for specific languages, not for other languages "
+       "(Module:Language,Method:InitializeStemming)"},
+      {CLanguage::kUsePhonetic,
+       "Phonetic search is only supported for specific languages, not for other languages "
+       "(Module:Language,Method:InitializePhonetic)"},
+      {CLanguage::kRemoveAccents,
+       "Accents can only be removed for specific languages, not for other languages. Use "
+       "custom character translation instead. (Module:Language,Method:LoadLanguage)"}};
+  for (const auto& [option, text] : other) {
+    EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(lngOther, option); }), text)) << option;
+    EXPECT_FALSE(language.IsLoaded());
+  }
 }
 
 TEST(Language, ConfigurationIsRememberedOnlyAfterACompleteLoad) {
@@ -249,33 +246,33 @@ class Translation : public ::testing::Test {
   LanguageFolder folder_;
 };
 
-TEST_F(Translation, EqualsAddsTheReversePairAfterTheForwardOne) {
-  EXPECT_EQ(Translate(u"AE = Ä\n", u"MÄRCHEN"), "MAERCHEN");
-  EXPECT_EQ(Translate(u"AE = Ä\n", u"MAERCHEN"), "MAERCHEN");
-  EXPECT_EQ(Translate(u"AE - Ä\n", u"MÄRCHEN"), "MÄRCHEN");
-  EXPECT_EQ(Translate(u"AE - Ä\n", u"MAERCHEN"), "MÄRCHEN");
-  // From texts are compared as written, against upper-case words.
-  EXPECT_EQ(Translate(u"ae - x\n", u"MAERCHEN"), "MAERCHEN");
-}
-
-TEST_F(Translation, TwoTokenLinesRepeatThePreviousOperator) {
-  const std::u16string lines = u"\r\nX - Y\r\n\r\nP Q\r\nA = B\n  \nC D\n";
-  EXPECT_EQ(Translate(lines, u"PCD"), "QCC");  // (C,D) then (D,C)
-  EXPECT_EQ(Translate(lines, u"XA"), "YA");     // (X,Y), (A,B), (B,A)
-}
-
-TEST_F(Translation, HashDeletesAndNeverBecomesAFromText) {
-  EXPECT_EQ(Translate(u"H - #\n", u"THOMAS"), "TOMAS");
-  EXPECT_EQ(Translate(u"Z = #\n", u"ZOO"), "OO");
-  EXPECT_EQ(Translate(u"Z = #\n", u"ABC"), "ABC");
-}
-
-TEST_F(Translation, AResultThatWouldReach200CharactersIsSkipped) {
-  const std::u16string lines = u"A - AA\nB - C\n";
-  EXPECT_EQ(Translate(lines, std::u16string(99, u'A')), std::string(198, 'A'));
-  EXPECT_EQ(Translate(lines, std::u16string(100, u'A')), std::string(100, 'A'));
-  // One replacement would fit, all of them would not.
-  EXPECT_EQ(Translate(lines, std::u16string(120, u'A') + u"B"), std::string(120, 'A') + "C");
+TEST_F(Translation, PairsOperatorsDeletionsAndTheLengthLimit) {
+  const std::u16string two_token = u"\r\nX - Y\r\n\r\nP Q\r\nA = B\n  \nC D\n";
+  const std::u16string growing = u"A - AA\nB - C\n";
+  struct Case {
+    std::u16string lines, word;
+    std::string expected;
+  };
+  const Case cases[] = {
+      // "=" adds the reverse pair after the forward one; "-" goes one way.
+      {u"AE = Ä\n", u"MÄRCHEN", "MAERCHEN"},
+      {u"AE = Ä\n", u"MAERCHEN", "MAERCHEN"},
+      {u"AE - Ä\n", u"MÄRCHEN", "MÄRCHEN"},
+      {u"AE - Ä\n", u"MAERCHEN", "MÄRCHEN"},
+      {u"ae - x\n", u"MAERCHEN", "MAERCHEN"},  // from texts compare as written, to upper-case words
+      // Two-token lines repeat the previous operator.
+      {two_token, u"PCD", "QCC"},  // (C,D) then (D,C)
+      {two_token, u"XA", "YA"},    // (X,Y), (A,B), (B,A)
+      // "#" deletes and never becomes a from text.
+      {u"H - #\n", u"THOMAS", "TOMAS"},
+      {u"Z = #\n", u"ZOO", "OO"},
+      {u"Z = #\n", u"ABC", "ABC"},
+      // A result that would reach 200 characters is skipped; one replacement may still fit.
+      {growing, std::u16string(99, u'A'), std::string(198, 'A')},
+      {growing, std::u16string(100, u'A'), std::string(100, 'A')},
+      {growing, std::u16string(120, u'A') + u"B", std::string(120, 'A') + "C"},
+  };
+  for (const Case& c : cases) EXPECT_EQ(Translate(c.lines, c.word), c.expected) << Utf16ToUtf8(c.lines);
 }
 
 TEST_F(Translation, MalformedLinesAreParseErrors) {
@@ -296,61 +293,62 @@ TEST_F(Translation, MalformedLinesAreParseErrors) {
 
 // --- stop words ---
 
-TEST(StopWords, TheHashSetAnswersLikeALinearSearchOfTheList) {
+TEST(StopWords, TokensBetweenBlanksAndLineEndsUpperCasedAndCutTo199) {
   const std::u16string long_word(250, u'Q');
-  const std::u16string file = u"the\r\nThe AND\tor ÉTÉ été straße ЖУК\n\n" + long_word + u" x";
   LanguageFolder folder;
   folder.WriteMinimal("Other");
-  folder.WriteUtf16("Other", "stop.txt", file);
+  folder.WriteUtf16("Other", "stop.txt", u"the\r\nThe AND\tor été straße ЖУК\n\n" + long_word + u" x");
   CLanguage language(folder.Path());
   language.LoadLanguage(lngOther, CLanguage::kUseStopWords);
-
-  // The list as it is stored: tokens between space, line feed and carriage
-  // return, upper-cased, cut to 199 characters.
-  std::vector<std::u16string> list;
-  std::u16string token;
-  for (const char16_t c : file + u" ") {
-    if (c == u' ' || c == u'\n' || c == u'\r') {
-      if (!token.empty()) list.push_back(ToUpper(token).substr(0, 199));
-      token.clear();
-    } else {
-      token.push_back(c);
-    }
+  using Words = std::vector<std::u16string>;
+  for (const auto& word : Words{u"THE", u"AND\tOR", u"ÉTÉ", u"STRAßE", u"ЖУК", u"X", long_word.substr(0, 199)}) {
+    EXPECT_TRUE(language.IsStopWord(word)) << Utf16ToUtf8(word);
   }
-  std::vector<std::u16string> probes = list;
-  for (const auto& w : list) {
-    probes.push_back(w.substr(0, w.size() - 1));
-    probes.push_back(w + u"S");
-    probes.push_back(ToLower(w));
-  }
-  probes.insert(probes.end(), {u"", u"ÉTÉ", u"STRASSE", u"AND\tOR", u"AND", long_word,
-                               long_word.substr(0, 198), u"X"});
-  for (const auto& probe : probes) {
-    const bool linear = std::find(list.begin(), list.end(), probe) != list.end();
-    EXPECT_EQ(language.IsStopWord(probe), linear) << Utf16ToUtf8(probe);
+  for (const auto& word : Words{u"", u"the", u"TH", u"THES", u"AND", u"OR", u"été", u"STRASSE", u"жук", long_word,
+                                long_word.substr(0, 198)}) {
+    EXPECT_FALSE(language.IsStopWord(word)) << Utf16ToUtf8(word);
   }
 }
 
-TEST(StopWords, AreTestedOnTheWordAsCutNotOnItsStem) {
+TEST(Normalise, ShippedAccentRemovalSoundMapsAndPhoneticCodes) {
+  struct Case {
+    int32_t language, options;
+    std::u16string word;
+    std::string expected;
+  };
+  const Case cases[] = {
+      // Accent removal leaves characters beyond Latin-1 alone (Ā's low byte is 0).
+      {lngGerman, CLanguage::kRemoveAccents, u"MÜLLER", "MULLER"},
+      {lngGerman, CLanguage::kRemoveAccents, u"ÇÀÉÎÕÜÝÿ", "CAEIOUYY"},
+      {lngGerman, CLanguage::kRemoveAccents, u"ÆØßÞ", "ÆØßÞ"},
+      {lngGerman, CLanguage::kRemoveAccents, u"ЖУРНАЛ", "ЖУРНАЛ"},
+      {lngGerman, CLanguage::kRemoveAccents, u"CAFÉ\u0416\u0100", "CAFE\u0416\u0100"},
+      // The sound map groups letters and leaves other scripts alone.
+      {lngDutch, CLanguage::kUsePhonetic, u"THOMAS", "TONAS"},
+      {lngDutch, CLanguage::kUsePhonetic, u"VAN", "FAN"},
+      {lngDutch, CLanguage::kUsePhonetic, u"R2D2", "R2T2"},
+      {lngDutch, CLanguage::kUsePhonetic, u"ЖУК", "ЖУК"},
+      {lngDutch, CLanguage::kUsePhonetic, u"ÇA'Ñ", "SAN"},
+      // English codes are not cut to four characters; German ones come from the rule file.
+      {lngEnglish, CLanguage::kUsePhonetic, u"INTERNATIONALISATION", "ANTRNXNLSXN"},
+      {lngEnglish, CLanguage::kUsePhonetic, u"SMITH", "SM0"},
+      {lngGerman, CLanguage::kUsePhonetic, u"SCHMIDT", "ZNIT"},
+      {lngGerman, CLanguage::kUsePhonetic, u"CHEMIE", "KENI"},
+      {lngGerman, CLanguage::kUsePhonetic | CLanguage::kRemoveAccents, u"MÜLLER", "NULA"},
+  };
   CLanguage language(ShippedLanguageFolder());
-  language.LoadLanguage(lngEnglish, true, true, false, false, false);
-  // OWNED is no stop word, so it is kept, though its stem OWN is one.
-  EXPECT_FALSE(language.IsStopWord(u"OWNED"));
-  EXPECT_EQ(N(language, u"OWNED"), "OWN");
-  EXPECT_TRUE(language.IsStopWord(u"OWN"));
-}
-
-// --- the steps and their order ---
-
-TEST(Normalise, AccentRemovalLeavesCharactersBeyondLatin1Alone) {
-  CLanguage language(ShippedLanguageFolder());
+  EXPECT_EQ(N(language, u"MÜLLER"), "MÜLLER");  // an unloaded object passes words through
+  EXPECT_FALSE(language.IsStopWord(u"THE"));
+  for (const Case& c : cases) {
+    language.LoadLanguage(c.language, c.options);
+    EXPECT_EQ(N(language, c.word), c.expected) << c.language << " " << c.options;
+  }
   language.LoadLanguage(lngGerman, CLanguage::kRemoveAccents);
-  EXPECT_EQ(N(language, u"MÜLLER"), "MULLER");
-  EXPECT_EQ(N(language, u"ÇÀÉÎÕÜÝÿ"), "CAEIOUYY");
-  EXPECT_EQ(N(language, u"ÆØßÞ"), "ÆØßÞ");
-  EXPECT_EQ(N(language, u"ЖУРНАЛ"), "ЖУРНАЛ");
-  EXPECT_EQ(N(language, u"CAFÉ\u0416\u0100"), "CAFE\u0416\u0100");  // Ā's low byte is 0
   EXPECT_EQ(language.Normalise(std::string_view("STRAẞE Ö")), "STRAẞE O");
+  language.LoadLanguage(lngDutch, CLanguage::kUsePhonetic);
+  EXPECT_EQ(language.GetPhoneticMode(), 1);
+  language.LoadLanguage(lngGerman, CLanguage::kUsePhonetic);
+  EXPECT_EQ(language.GetPhoneticMode(), CLanguage::kPhonetMode);
 }
 
 TEST(Normalise, APlainMapEntryOfZeroEndsTheWord) {
@@ -386,40 +384,6 @@ TEST(Normalise, StepsRunAsAccentsStemmingTranslationPhonetic) {
   CLanguage dutch(folder.Path());
   dutch.LoadLanguage(lngDutch, false, false, true, false, true);
   EXPECT_EQ(N(dutch, u"PHILIPS"), "FILIBS");  // translated before the sound map
-}
-
-TEST(Normalise, TheSoundMapGroupsLettersAndLeavesOtherScriptsAlone) {
-  CLanguage dutch(ShippedLanguageFolder());
-  dutch.LoadLanguage(lngDutch, CLanguage::kUsePhonetic);
-  EXPECT_EQ(dutch.GetPhoneticMode(), 1);
-  EXPECT_EQ(N(dutch, u"THOMAS"), "TONAS");
-  EXPECT_EQ(N(dutch, u"VAN"), "FAN");
-  EXPECT_EQ(N(dutch, u"R2D2"), "R2T2");
-  EXPECT_EQ(N(dutch, u"ЖУК"), "ЖУК");
-  EXPECT_EQ(N(dutch, u"ÇA'Ñ"), "SAN");
-}
-
-TEST(Normalise, EnglishPhoneticCodesAreNotCutToFourCharacters) {
-  CLanguage english(ShippedLanguageFolder());
-  english.LoadLanguage(lngEnglish, CLanguage::kUsePhonetic);
-  EXPECT_EQ(N(english, u"INTERNATIONALISATION"), "ANTRNXNLSXN");
-  EXPECT_EQ(N(english, u"SMITH"), "SM0");
-}
-
-TEST(Normalise, GermanPhoneticCodesComeFromTheRuleFile) {
-  CLanguage german(ShippedLanguageFolder());
-  german.LoadLanguage(lngGerman, CLanguage::kUsePhonetic);
-  EXPECT_EQ(german.GetPhoneticMode(), CLanguage::kPhonetMode);
-  EXPECT_EQ(N(german, u"SCHMIDT"), "ZNIT");
-  EXPECT_EQ(N(german, u"CHEMIE"), "KENI");
-  german.LoadLanguage(lngGerman, CLanguage::kUsePhonetic | CLanguage::kRemoveAccents);
-  EXPECT_EQ(N(german, u"MÜLLER"), "NULA");
-}
-
-TEST(Normalise, AnUnloadedObjectPassesWordsThrough) {
-  CLanguage language(ShippedLanguageFolder());
-  EXPECT_EQ(N(language, u"MÜLLER"), "MÜLLER");
-  EXPECT_FALSE(language.IsStopWord(u"THE"));
 }
 
 }  // namespace

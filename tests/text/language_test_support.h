@@ -18,6 +18,10 @@ std::string ShippedLanguageFolder();
 // The tab-separated fields of every non-empty line that does not start with "#".
 std::vector<std::vector<std::string>> ReadTable(const std::string& path);
 
+inline bool Contains(const std::string& text, const std::string& part) {
+  return text.find(part) != std::string::npos;
+}
+
 // The full message chain of the engine exception body raises, or "" if none.
 std::string FailureText(const std::function<void()>& body);
 

@@ -18,10 +18,6 @@
 namespace qm::test {
 namespace {
 
-bool Contains(const std::string& text, const std::string& part) {
-  return text.find(part) != std::string::npos;
-}
-
 WordPipelineOptions Options(int32_t language, int32_t language_flags,
                             int32_t general_flags = WordPipelineOptions::kAddDefaultSeparators,
                             std::u16string separators = {}) {
@@ -104,25 +100,6 @@ TEST(WordPipeline, OptionBitsAreReadAsTheFindexStoresThem) {
   header.LanguageFlags = CLanguage::kUseStemming;
   CWordPipeline both(ShippedLanguageFolder(), WordPipelineOptions::FromHeader(header));
   EXPECT_EQ(Written(both, "rivers,run"), "1:RIVER 2:RUN");
-}
-
-TEST(WordPipeline, PositionsRunOnAcrossValuesWithSentenceGaps) {
-  CWordPipeline pipeline(ShippedLanguageFolder(), Options(lngEnglish, CLanguage::kUseStopWords));
-  std::vector<std::string> seen;
-  std::int32_t position = 0;
-  const auto visit = [&](const SplitWord& w) {
-    seen.push_back(std::to_string(w.position) + ":" + Utf16ToUtf8(w.form) + ":" +
-                   std::to_string(static_cast<int>(w.code)));
-  };
-  // SEA ends a sentence (gap at 4); so does the dropped IS (gap at 5).
-  pipeline.WrittenWords(std::string("Rivers run to the sea. It is. Wide"), position, visit);
-  EXPECT_EQ(position, 6);
-  // The builder moves on by one between columns and feeds the next value.
-  ++position;
-  pipeline.WrittenWords(std::u16string(u"deep. the"), position, visit);
-  EXPECT_EQ(seen, (std::vector<std::string>{"1:RIVERS:3", "2:RUN:3", "3:SEA:2", "6:WIDE:3",
-                                            "8:DEEP:2"}));
-  EXPECT_EQ(position, 9);
 }
 
 TEST(WordPipeline, LanguageDataComesFromTheSettingsAndOnlyForLanguageSteps) {

@@ -14,48 +14,57 @@
 namespace qm {
 namespace {
 
-// "position:CUT=FORM" for every word considered, blank-separated.
+// "position:CUT" for every word considered, with "=FORM" where the form differs.
 template <class Text>
 std::string Words(CWordSplitter& splitter, const Text& text, std::int32_t position = 0) {
   std::string out;
   splitter.Split(text, position, [&](const SplitWord& w) {
-    out += (out.empty() ? "" : " ") + std::to_string(w.position) + ":" + Utf16ToUtf8(w.cut) + "=" +
-           Utf16ToUtf8(w.form);
+    out += (out.empty() ? "" : " ") + std::to_string(w.position) + ":" + Utf16ToUtf8(w.cut) +
+           (w.form == w.cut ? "" : "=" + Utf16ToUtf8(w.form));
   });
   return out;
 }
 
-CWordSplitter DefaultSplitter(bool remove_html = false, CWordFilter* filter = nullptr) {
-  return CWordSplitter(CSeparatorSet(DefaultSeparators()), remove_html, filter);
-}
+TEST(WordSplitter, MarkupSentenceGapsCaseAndSeparators) {
+  CWordSplitter plain(CSeparatorSet(DefaultSeparators()), false);
+  CWordSplitter html(CSeparatorSet(DefaultSeparators()), true);
+  // « is C2 AB and – is E2 80 93; ª (C2 AA) and — (E2 80 94) share bytes with them.
+  CWordSplitter own(CSeparatorSet(BuildSeparators(u"\u00AB\u2013", true)), false);
+  struct Case {
+    CWordSplitter& splitter;
+    std::string text, expected;
+  };
+  const Case cases[] = {
+      // Tags go without leaving a blank; upper-casing comes first, so scripts go
+      // in any case; an unclosed tag takes the rest.
+      {html, "one<b>two", "1:ONETWO"},
+      {html, "one <b> two", "1:ONE 2:TWO"},
+      {html, "a<script>var x;</Script>b c <img src=lost", "1:AB 2:C"},
+      {plain, "one<b>two", "1:ONE 2:B 3:TWO"},
+      // Sentence ends leave a position gap.
+      {plain, "one two. three", "1:ONE 2:TWO 4:THREE"},
+      {plain, "end.next", "1:END 2:NEXT"},
+      {plain, "j. smith", "1:J 2:SMITH"},
+      {plain, "wait... then", "1:WAIT 3:THEN"},
+      {plain, "", ""},
+      {plain, " .;- ", ""},
+      // ß and ﬁ have no one-character upper case and stay; Deseret (outside the BMP) has one.
+      {plain, "straße élan \xEF\xAC\x81n \xF0\x90\x90\xA8x",
+       "1:STRAßE 2:ÉLAN 3:\xEF\xAC\x81N 4:\xF0\x90\x90\x80X"},
+      {own, "x\xC2\xAAy\xC2\xABz a\xE2\x80\x94" "b\xE2\x80\x93" "c", "1:X\xC2\xAAY 2:Z 3:A\xE2\x80\x94" "B 4:C"},
+      {own, "a\xFF" "b", "1:A\xEF\xBF\xBD" "B"},  // invalid bytes become U+FFFD, part of the word
+  };
+  for (const Case& c : cases) EXPECT_EQ(Words(c.splitter, c.text), c.expected) << c.text;
+  EXPECT_EQ(Words(plain, std::u16string(u"stra\u00DFe \U00010428x")), "1:STRAßE 2:\xF0\x90\x90\x80X");
 
-TEST(WordSplitter, TagsAreRemovedWithoutLeavingABlank) {
-  CWordSplitter html = DefaultSplitter(true);
-  EXPECT_EQ(Words(html, std::string("one<b>two")), "1:ONETWO=ONETWO");
-  EXPECT_EQ(Words(html, std::string("one <b> two")), "1:ONE=ONE 2:TWO=TWO");
-  // Upper-casing comes first, so scripts go in any case; an unclosed tag takes the rest.
-  EXPECT_EQ(Words(html, std::string("a<script>var x;</Script>b c <img src=lost")), "1:AB=AB 2:C=C");
-  CWordSplitter plain = DefaultSplitter(false);
-  EXPECT_EQ(Words(plain, std::string("one<b>two")), "1:ONE=ONE 2:B=B 3:TWO=TWO");
-}
-
-TEST(WordSplitter, SentenceEndsLeaveAPositionGap) {
-  CWordSplitter splitter = DefaultSplitter();
-  EXPECT_EQ(Words(splitter, std::string("one two. three")), "1:ONE=ONE 2:TWO=TWO 4:THREE=THREE");
-  EXPECT_EQ(Words(splitter, std::string("end.next")), "1:END=END 2:NEXT=NEXT");
-  EXPECT_EQ(Words(splitter, std::string("j. smith")), "1:J=J 2:SMITH=SMITH");
-  EXPECT_EQ(Words(splitter, std::string("wait... then")), "1:WAIT=WAIT 3:THEN=THEN");
   // The ".." left after "wait..." at the end is never a word but still ends the text.
-  std::int32_t after_wait = 0;
-  EXPECT_EQ(Words(splitter, std::string("wait..."), after_wait), "1:WAIT=WAIT");
-  splitter.Split(std::string("wait..."), after_wait, [](const SplitWord&) {});
-  EXPECT_EQ(after_wait, 3);
-  // Values of separators only give nothing.
-  EXPECT_EQ(Words(splitter, std::string("")), "");
-  EXPECT_EQ(Words(splitter, std::string(" .;- ")), "");
+  std::int32_t position = 0;
+  EXPECT_EQ(Words(plain, std::string("wait..."), position), "1:WAIT");
+  plain.Split(std::string("wait..."), position, [](const SplitWord&) {});
+  EXPECT_EQ(position, 3);
   // The position is the caller's and runs on from where it stands.
-  std::int32_t position = 10;
-  splitter.Split(std::u16string(u"alpha beta."), position, [](const SplitWord&) {});
+  position = 10;
+  plain.Split(std::u16string(u"alpha beta."), position, [](const SplitWord&) {});
   EXPECT_EQ(position, 14);  // BETA at 12, the sentence end, then the blank remainder
 }
 
@@ -75,28 +84,10 @@ class TestFilter : public CWordFilter {
 
 TEST(WordSplitter, DroppedWordsKeepTheirSentenceGap) {
   TestFilter filter;
-  CWordSplitter splitter = DefaultSplitter(false, &filter);
+  CWordSplitter splitter(CSeparatorSet(DefaultSeparators()), false, &filter);
   EXPECT_EQ(Words(splitter, std::string("the rivers xx run. it. flows")),
-            "0:THE= 1:RIVERS=RIVER 1:XX= 2:RUN=RUN 3:IT= 5:FLOWS=FLOW");
+            "0:THE= 1:RIVERS=RIVER 1:XX= 2:RUN 3:IT= 5:FLOWS=FLOW");
   EXPECT_EQ(filter.asked[1], u"RIVERS");  // the stop test sees the word as cut
-}
-
-TEST(WordSplitter, UpperCasingIsSimplePerCharacter) {
-  CWordSplitter splitter = DefaultSplitter();
-  // ß and ﬁ have no one-character upper case and stay; Deseret (outside the BMP) has one.
-  EXPECT_EQ(Words(splitter, std::string("straße élan \xEF\xAC\x81n \xF0\x90\x90\xA8x")),
-            "1:STRAßE=STRAßE 2:ÉLAN=ÉLAN 3:\xEF\xAC\x81N=\xEF\xAC\x81N 4:\xF0\x90\x90\x80X=\xF0\x90\x90\x80X");
-  EXPECT_EQ(Words(splitter, std::u16string(u"stra\u00DFe \U00010428x")),
-            "1:STRAßE=STRAßE 2:\xF0\x90\x90\x80X=\xF0\x90\x90\x80X");
-}
-
-TEST(WordSplitter, NonAsciiSeparatorsCutOnlyWhereTheyStand) {
-  // « is C2 AB and – is E2 80 93; ª (C2 AA) and — (E2 80 94) share bytes with them.
-  CWordSplitter splitter(CSeparatorSet(BuildSeparators(u"\u00AB\u2013", true)), false);
-  EXPECT_EQ(Words(splitter, std::string("x\xC2\xAAy\xC2\xABz a\xE2\x80\x94" "b\xE2\x80\x93" "c")),
-            "1:X\xC2\xAAY=X\xC2\xAAY 2:Z=Z 3:A\xE2\x80\x94" "B=A\xE2\x80\x94" "B 4:C=C");
-  // Invalid bytes become U+FFFD, part of the word.
-  EXPECT_EQ(Words(splitter, std::string("a\xFF" "b")), "1:A\xEF\xBF\xBD" "B=A\xEF\xBF\xBD" "B");
 }
 
 // Random input never crashes or stalls, positions never go back, and the words
@@ -152,7 +143,7 @@ TEST(WordSplitter, RandomInputGivesTheRunsBetweenSeparators) {
 
 TEST(WordSplitter, RandomBytesAsUtf8NeverStall) {
   std::mt19937 rng(7);
-  CWordSplitter splitter = DefaultSplitter(true);
+  CWordSplitter splitter(CSeparatorSet(DefaultSeparators()), true);
   for (int round = 0; round < 300; ++round) {
     std::string bytes(rng() % 600, '\0');
     for (auto& b : bytes) b = static_cast<char>(rng());

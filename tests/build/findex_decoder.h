@@ -7,6 +7,7 @@
 #include <compare>
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <variant>
@@ -34,6 +35,13 @@ struct Entry {
 };
 
 using Posting = std::vector<int32_t>;  // key, [weight], [position]
+
+// A little-endian 32-bit integer at at.
+int32_t LoadInt32(const std::string& in, std::size_t at);
+// The value of the type code (1, 2, 3, 4, 6) at pos, moving pos past it;
+// nullopt, pos unmoved, when it would pass limit.
+std::optional<WordValue> DecodeValue(const std::string& in, std::size_t& pos, std::size_t limit,
+                                     int32_t type);
 
 struct Word {
   WordValue value;

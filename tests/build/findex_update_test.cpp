@@ -77,15 +77,12 @@ class FindexUpdateTest : public test::DataSourceTest {
   // The deleted-key file's keys, decoded from its documented layout.
   std::vector<int32_t> DeletedKeys(const std::string& upper_name) const {
     const std::string bytes = test::ReadFile(IndexFolder() + upper_name + ".del");
-    auto at = [&](std::size_t offset) {
-      uint32_t v = 0;
-      for (int i = 3; i >= 0; --i) v = (v << 8) | static_cast<uint8_t>(bytes.at(offset + i));
-      return static_cast<int32_t>(v);
-    };
-    const int32_t count = at(0);
-    EXPECT_EQ(bytes.size(), 4 + 4 * static_cast<std::size_t>(count));
     std::vector<int32_t> keys;
-    for (int32_t i = 0; i < count; ++i) keys.push_back(at(4 + 4 * static_cast<std::size_t>(i)));
+    if (bytes.size() < 4 || bytes.size() != 4 + 4 * static_cast<uint32_t>(test::LoadInt32(bytes, 0))) {
+      ADD_FAILURE() << "a .del of " << bytes.size() << " bytes";
+      return keys;
+    }
+    for (std::size_t at = 4; at < bytes.size(); at += 4) keys.push_back(test::LoadInt32(bytes, at));
     return keys;
   }
 

@@ -4,6 +4,7 @@
 #include <bit>
 #include <limits>
 
+#include "platform/text_encoding.h"
 #include "support/test_support.h"
 
 namespace qm::test {
@@ -219,6 +220,17 @@ void PrintTo(const Word& word, std::ostream* out) {
 int32_t TypeCode(const WordValue& value) {
   constexpr int32_t kCodes[] = {1, 2, 3, 4, 6};
   return kCodes[value.index()];
+}
+
+std::string WordText(const WordValue& v) {
+  if (const auto* s = std::get_if<std::string>(&v)) return *s;
+  if (const auto* w = std::get_if<std::u16string>(&v)) return Utf16ToUtf8(*w);
+  if (const auto* i = std::get_if<int32_t>(&v)) return std::to_string(*i);
+  if (const auto* d = std::get_if<double>(&v)) return std::to_string(*d);
+  const auto& t = std::get<Date16>(v);
+  return std::to_string(t.year) + "-" + std::to_string(t.month) + "-" + std::to_string(t.day) +
+         " " + std::to_string(t.hour) + ":" + std::to_string(t.minute) + ":" +
+         std::to_string(t.second);
 }
 
 void WriteSortedFile(const std::string& path, const std::vector<Entry>& entries, int32_t flags) {

@@ -26,6 +26,8 @@ struct Date16 {
 // UnicodeString (4), Double (6), in this order of alternatives.
 using WordValue = std::variant<int32_t, std::string, Date16, std::u16string, double>;
 int32_t TypeCode(const WordValue& value);
+// A value as text: text as UTF-8, numbers by std::to_string, dates "Y-M-D h:m:s".
+std::string WordText(const WordValue& value);
 
 struct Entry {
   WordValue value;

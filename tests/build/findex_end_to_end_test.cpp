@@ -51,12 +51,7 @@ TEST_P(FindexEndToEndTest, CreateFindexWithWeightsAndTagsAndEveryInformationValu
   // too; only written words take a position (THE is a stop word); title
   // words weigh 3.
   std::map<std::string, std::vector<test::Posting>> words;
-  for (const test::Word& word : findex.words) {
-    const auto* wide = std::get_if<std::u16string>(&word.value);
-    const auto* narrow = std::get_if<std::string>(&word.value);
-    ASSERT_TRUE(unicode ? wide != nullptr : narrow != nullptr);
-    words[unicode ? Utf16ToUtf8(*wide) : *narrow] = word.postings;
-  }
+  for (const test::Word& word : findex.words) words[test::WordText(word.value)] = word.postings;
   const std::map<std::string, std::vector<test::Posting>> expected = {
       {"FISH", {{1, 3, 6}, {2, 1, 1}}},
       {"MOUNTAIN", {{2, 3, 4}}},

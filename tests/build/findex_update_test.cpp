@@ -276,12 +276,9 @@ TEST_P(FindexUpdateTest, AddOnsAreBuiltWithTheStoredDefinitionAndOptions) {
   // Stemmed, with the body's weight: (word, key, weight) of each posting.
   std::vector<std::tuple<std::string, int32_t, int32_t>> postings;
   for (const test::Word& word : decoded.words) {
-    const auto* wide = std::get_if<std::u16string>(&word.value);
-    const auto* narrow = std::get_if<std::string>(&word.value);
-    ASSERT_TRUE(wide != nullptr || narrow != nullptr) << "a word that is not text";
     for (const test::Posting& p : word.postings) {
       ASSERT_EQ(p.size(), 3u) << "key, weight and position";
-      postings.emplace_back(wide != nullptr ? Utf16ToUtf8(*wide) : *narrow, p[0], p[1]);
+      postings.emplace_back(test::WordText(word.value), p[0], p[1]);
     }
   }
   EXPECT_EQ(postings, (std::vector<std::tuple<std::string, int32_t, int32_t>>{{"FRESH", 701, 2},

@@ -1,6 +1,6 @@
 // The word sort against real data sources: the entries of the sorted file,
-// the findex type, the row errors, updates and partial builds, document
-// columns, and the files left behind.
+// the findex type, the row errors, document columns, and the files left
+// behind.
 #include "build/word_sort.h"
 
 #include <gtest/gtest.h>
@@ -53,22 +53,11 @@ class WordSortTest : public test::SourceRowsTest {
     return entries;
   }
 
-  static std::string Text(const test::WordValue& v) {
-    if (const auto* s = std::get_if<std::string>(&v)) return *s;
-    if (const auto* w = std::get_if<std::u16string>(&v)) return Utf16ToUtf8(*w);
-    if (const auto* i = std::get_if<int32_t>(&v)) return std::to_string(*i);
-    if (const auto* d = std::get_if<double>(&v)) return std::to_string(*d);
-    const auto& t = std::get<test::Date16>(v);
-    return std::to_string(t.year) + "-" + std::to_string(t.month) + "-" + std::to_string(t.day) +
-           " " + std::to_string(t.hour) + ":" + std::to_string(t.minute) + ":" +
-           std::to_string(t.second);
-  }
-
   std::vector<Entry> SortedEntries(CIndexHeader& d) {
     const CColumnSet set = CColumnSet::FromGeneralFlags(d.GeneralFlags);
     std::vector<Entry> out;
     for (const auto& e : Sort(d)) {
-      out.emplace_back(Text(e.value), e.row[0], set.s ? e.row[1] : 0,
+      out.emplace_back(test::WordText(e.value), e.row[0], set.s ? e.row[1] : 0,
                        set.p ? e.row[set.PositionColumn()] : 0);
     }
     return out;
@@ -162,45 +151,6 @@ TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile)
   CIndexHeader all_null = Findex(empty, {{"title", {}}}, 6);
   EXPECT_TRUE(Sort(all_null).empty());
   EXPECT_EQ(all_null.KeyCount, 1);
-}
-
-TEST_P(WordSortTestSqlite, UpdatesAndPartialBuildsReadOnlyTheirKeys) {
-  const std::string t = Table("id INTEGER, title TEXT, d TIMESTAMP");
-  for (int key : {1, 2, 500, 501, 199999, 200000}) {
-    Run("INSERT INTO " + t + " VALUES (" + std::to_string(key) + ", 'w" + std::to_string(key) +
-        "', NULL)");
-  }
-  auto keys = [&](CIndexHeader& d) {
-    std::vector<int32_t> out;
-    for (const auto& e : SortedEntries(d)) out.push_back(std::get<1>(e));
-    std::sort(out.begin(), out.end());
-    return out;
-  };
-  CIndexHeader update = Findex(t, {{"title", {}}}, 6);
-  update.SortMax = 500;
-  EXPECT_EQ(keys(update), (std::vector<int32_t>{501, 199999, 200000}));
-  EXPECT_EQ(update.SortMax, 200000);
-  EXPECT_NE(home_.TraceText().find("SQL: select id,title from " + t + " where id>500"),
-            std::string::npos);
-
-  CIndexHeader slice = Findex(t, {{"title", {}}}, 6);
-  slice.IndexMaxSize = 2;
-  slice.IndexStartValue = 1;
-  EXPECT_EQ(keys(slice), (std::vector<int32_t>{1, 2, 500, 501, 199999}));
-  EXPECT_EQ(slice.SortMax, 199999);
-
-  // The date/time update key: the highest value read is kept, and an update
-  // reads only rows past it.
-  Run("INSERT INTO " + t + " VALUES (7, 'old', '2024-01-01 10:00:00')");
-  Run("INSERT INTO " + t + " VALUES (8, 'new', '2024-01-03 08:00:00')");
-  CIndexHeader dated = Findex(t, {{"title", {}}}, 6);
-  dated.UpdateFlags = 1;
-  dated.DateTimeKeyColumn = "d";
-  EXPECT_EQ(keys(dated).size(), 8u);
-  EXPECT_EQ(dated.MaxDateTimeKey, (DateTimeValue{2024, 1, 3, 8, 0, 0, 0}));
-  dated.MaxDateTimeKey = {2024, 1, 2, 0, 0, 0, 0};
-  EXPECT_EQ(Values(dated), std::vector<std::string>{"NEW"});
-  EXPECT_NE(home_.TraceText().find(" where d>'2024-01-02 00:00:00'"), std::string::npos);
 }
 
 TEST_P(WordSortTestSqlite, DocumentColumnsIndexTheirTextAndFilesOutsideTheBaseAreRefused) {

@@ -7,8 +7,8 @@ namespace {
 
 using ColumnParserTest = TranslatorTest;  // for the shipped error texts
 
-TEST_F(ColumnParserTest, FindexColumnsWithTags) {
-  ColumnMap columns;
+TEST_F(ColumnParserTest, FindexColumnsWithTagsRepeatedColumnsReplaced) {
+  ColumnMap columns{{"stale", {}}};
   ParseFindexColumns(
       u" title : CONTENT_WEIGHT = 3 :CONTENT_TYPE=URL:BASE_URL=\"http://host:8080/docs/\","
       u"\"body, text\":DOCUMENT_TYPE=\"a\"\"b\",page:BASE_URL=\"http://h/?a=b\",zeta",
@@ -19,10 +19,8 @@ TEST_F(ColumnParserTest, FindexColumnsWithTags) {
       {"title", {{"BASE_URL", "http://host:8080/docs/"}, {"CONTENT_TYPE", "URL"}, {"CONTENT_WEIGHT", "3"}}},
       {"zeta", {}}};
   EXPECT_EQ(columns, expected);
-}
 
-TEST_F(ColumnParserTest, RepeatedFindexColumnReplacesTheEarlierOne) {
-  ColumnMap columns{{"stale", {}}};
+  // A repeated column replaces the earlier one; the map is replaced whole.
   ParseFindexColumns(u"b,a:X=1,a:Y=2", columns, "TranslateW");
   EXPECT_EQ(columns, (ColumnMap{{"a", {{"Y", "2"}}}, {"b", {}}}));
   CIndexHeader header;

@@ -9,7 +9,7 @@
 #include <filesystem>
 #include <thread>
 
-#include "api/command_fixture.h"
+#include "build/data_source_fixture.h"
 #include "build/command_locks.h"
 #include "build/command_type.h"
 #include "locks/lock_manager.h"
@@ -22,13 +22,6 @@ using test::CommandFixture;
 
 class CommandEngineTest : public CommandFixture {
  protected:
-  void WaitForJob() {
-    for (int i = 0; i < 60000 && Progress() != 100; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    ASSERT_EQ(Progress(), 100) << "the background job did not end";
-  }
-
   static bool Contains(const std::string& text, std::string_view part) {
     return text.find(part) != std::string::npos;
   }
@@ -44,7 +37,7 @@ TEST_F(CommandEngineTest, BackgroundJobIsVisibleBeforeExecuteReturnsAndReportsOn
   EXPECT_EQ(Progress(), 0);
   EXPECT_EQ(ErrorNumber(), 0);
   create_lock.UnlockWriter();
-  WaitForJob();
+  test::WaitForJob(*command_);
 
   // The findex does not exist: the job failed and says why, once.
   EXPECT_EQ(ErrorNumber(), 1);
@@ -55,7 +48,7 @@ TEST_F(CommandEngineTest, BackgroundJobIsVisibleBeforeExecuteReturnsAndReportsOn
 
   // A job that succeeds sets the flag back (SET GROUP on the job's own copy).
   ASSERT_EQ(command_->ExecuteEx(T("SET GROUP PUBLIC"), 0), S_OK);
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 0);
   EXPECT_EQ(ErrorMsg(), "");
 }
@@ -78,12 +71,12 @@ TEST_F(CommandEngineTest, AnEndingJobLeavesTheProgressOfALaterOne) {
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   second.UnlockWriter();
-  WaitForJob();
+  test::WaitForJob(*command_);
 }
 
 TEST_F(CommandEngineTest, BackgroundTranslationErrorsAndConcurrentJobs) {
   ASSERT_EQ(command_->Execute(T("CREATE FINDEX Books ON TABLE t COLUMNS a KEY")), S_OK);
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 1);
   EXPECT_TRUE(Contains(ErrorMsg(), "a word is missing")) << "error 13 of the translator";
 
@@ -97,33 +90,39 @@ TEST_F(CommandEngineTest, BackgroundTranslationErrorsAndConcurrentJobs) {
   EXPECT_EQ(Progress(), 100);
 }
 
-TEST_F(CommandEngineTest, MissingGroupClearsDataPathValidForGood) {
-  const std::string missing = Run("SET GROUP Nowhere");
-  EXPECT_TRUE(Contains(missing, "group folder does not exist")) << missing;
-  // Even a group that exists does not bring the data path back.
-  LayOutGroup("LATER");
-  EXPECT_EQ(Run("SET GROUP Later"), "");
-  const std::string refused = Run("CREATE FINDEX Books ON TABLE t COLUMNS a KEY id");
-  EXPECT_TRUE(Contains(refused, "group folder does not exist")) << refused;
-  EXPECT_TRUE(Contains(Run("UPDATE FINDEX Books"), "group folder does not exist"));
-}
+TEST_F(CommandEngineTest, GroupAndDataPathRules) {
+  const std::string missing_path = home_.Data() + "no/such/folder";
+  EXPECT_EQ(command_->SetDataPath(T(missing_path)), DISP_E_EXCEPTION);
+  EXPECT_EQ(LastError(), "Data path does not exist: " + missing_path +
+                             " (Module:PiStartPoint,Method:SetDataPath)\r\n");
 
-TEST_F(CommandEngineTest, BackgroundSetGroupChangesOnlyTheJobsCopy) {
+  // FindexExist sets the group: option files now go to its Config folder.
+  LayOutGroup("OTHER");
+  VARIANT_BOOL exists = 3;
+  ASSERT_EQ(command_->FindexExist(T("Books"), T("Other"), &exists), S_OK);
+  EXPECT_EQ(exists, VARIANT_FALSE);
+  ASSERT_EQ(command_->SaveDefaultOrderOptions(), S_OK);
+  EXPECT_TRUE(fs::exists(GroupFolder("OTHER") + "Config/ogo.dat"));
+  EXPECT_FALSE(fs::exists(ConfigFolder() + "ogo.dat"));
+
+  // A background SET GROUP changes only the job's copy: the engine keeps a
+  // valid data path, and an update gets as far as looking for the findex.
   ASSERT_EQ(command_->Execute(T("SET GROUP Nowhere")), S_OK);
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 1);
-  // The engine keeps its group and a valid data path: the update gets as far
-  // as looking for the findex.
-  const std::string text = Run("UPDATE FINDEX Books");
+  std::string text = Run("UPDATE FINDEX Books");
   EXPECT_FALSE(Contains(text, "group folder does not exist")) << text;
   EXPECT_FALSE(text.empty());
-}
 
-TEST_F(CommandEngineTest, DataPathMustExist) {
-  const std::string missing = home_.Data() + "no/such/folder";
-  EXPECT_EQ(command_->SetDataPath(T(missing)), DISP_E_EXCEPTION);
-  EXPECT_EQ(LastError(), "Data path does not exist: " + missing +
-                             " (Module:PiStartPoint,Method:SetDataPath)\r\n");
+  // A blocking one to a missing group clears the data path for good: even a
+  // group that exists does not bring it back.
+  text = Run("SET GROUP Nowhere");
+  EXPECT_TRUE(Contains(text, "group folder does not exist")) << text;
+  LayOutGroup("LATER");
+  EXPECT_EQ(Run("SET GROUP Later"), "");
+  text = Run("CREATE FINDEX Books ON TABLE t COLUMNS a KEY id");
+  EXPECT_TRUE(Contains(text, "group folder does not exist")) << text;
+  EXPECT_TRUE(Contains(Run("UPDATE FINDEX Books"), "group folder does not exist"));
 }
 
 TEST_F(CommandEngineTest, ConnectionsAreTestedWhenSet) {
@@ -147,30 +146,25 @@ TEST_F(CommandEngineTest, ConnectionsAreTestedWhenSet) {
 }
 
 TEST_F(CommandEngineTest, CreateIndexGoesToTheDataSource) {
-  UseSqlite();
-  Sql({"create table books (id integer, title text)"});
-  EXPECT_EQ(Run("CREATE INDEX books_title ON books (title)"), "");
-  // A second index of the same name is the data source's error.
-  EXPECT_TRUE(Contains(Run("CREATE INDEX books_title ON books (title)"), "books_title"));
-  EXPECT_FALSE(Run("CREATE INDEX broken ON no_table (x)").empty());
-}
-
-TEST_F(CommandEngineTest, PostgreSQLConnectionsAndCreateIndex) {
-  for (const char* variable : {"QM_TEST_PG_ANSI", "QM_TEST_PG_UNICODE"}) {
-    const char* connection = std::getenv(variable);
-    if (connection == nullptr || *connection == '\0') GTEST_SKIP() << variable << " is not set";
+  for (const char* variable : {"", "QM_TEST_PG_ANSI", "QM_TEST_PG_UNICODE"}) {
+    SCOPED_TRACE(variable);
+    const char* pg = *variable ? std::getenv(variable) : nullptr;
+    if (*variable && (pg == nullptr || *pg == '\0')) GTEST_SKIP() << variable << " is not set";
+    const std::string connection = pg ? pg : SqliteConnection();
     const std::string table = "engine_books_" + std::to_string(getpid());
     CGlobalDefs defs;
-    defs.SetConnectionString(connection, "pg");
+    defs.SetConnectionString(connection, "test");
     CShareDatabase database(defs);
     database.Connect();
     int16_t columns = 0;
     database.ExecuteSql("create table " + table + " (id integer, title varchar(80))", columns);
 
-    EXPECT_EQ(Run(std::string("SET CONNECTIONSTRING \"") + connection + "\""), "") << variable;
+    EXPECT_EQ(Run("SET CONNECTIONSTRING \"" + connection + "\""), "");
     const std::string create = "CREATE INDEX " + table + "_title ON " + table + " (title)";
     EXPECT_EQ(Run(create), "");
-    EXPECT_TRUE(Contains(Run(create), "already exists")) << "the index is there";
+    // A second index of the same name is the data source's error.
+    EXPECT_TRUE(Contains(Run(create), table + "_title"));
+    EXPECT_FALSE(Run("CREATE INDEX broken ON no_table (x)").empty());
     database.ExecuteSql("drop table " + table, columns);
     database.Disconnect();
   }
@@ -224,17 +218,6 @@ TEST_F(CommandEngineTest, DefinitionsThatDoNotFitTheHeaderAreRefusedBeforeAnyWor
             DISP_E_EXCEPTION);
   EXPECT_EQ(Progress(), 100) << "no job was started";
   EXPECT_TRUE(fs::is_empty(IndexFolder()));
-}
-
-TEST_F(CommandEngineTest, FindexExistSetsTheGroup) {
-  LayOutGroup("OTHER");
-  VARIANT_BOOL exists = 3;
-  ASSERT_EQ(command_->FindexExist(T("Books"), T("Other"), &exists), S_OK);
-  EXPECT_EQ(exists, VARIANT_FALSE);
-  // Option files now go to the other group's Config folder.
-  ASSERT_EQ(command_->SaveDefaultOrderOptions(), S_OK);
-  EXPECT_TRUE(fs::exists(GroupFolder("OTHER") + "Config/ogo.dat"));
-  EXPECT_FALSE(fs::exists(ConfigFolder() + "ogo.dat"));
 }
 
 TEST_F(CommandEngineTest, TraceSessionBannerAndStatements) {

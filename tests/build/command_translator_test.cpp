@@ -5,7 +5,7 @@
 namespace qm::test {
 namespace {
 
-TEST_F(TranslatorTest, FindexDefinitionWithKeywordsInAnyCase) {
+TEST_F(TranslatorTest, DefinitionsWithKeywordsInAnyCase) {
   index_options.GeneralFlags = 3;
   order_options.IgnoreChars = u"-";
   Translate("create findex Books on table books columns title:CONTENT_WEIGHT=3,body KEY id");
@@ -19,6 +19,13 @@ TEST_F(TranslatorTest, FindexDefinitionWithKeywordsInAnyCase) {
   // The engine's current options go with every statement.
   EXPECT_EQ(findex.GeneralFlags, 3);
   EXPECT_EQ(order.IgnoreChars, u"-");
+
+  // Order columns keep the statement's order.
+  Translate("CREATE ORDER ByTitle ON TABLE books COLUMNS title, year,author KEY id");
+  EXPECT_EQ(cmd.CmdType(), kCmdOrderDefined);
+  EXPECT_EQ(order.OrderName, "ByTitle");
+  EXPECT_EQ(order.KeyColumn, "id");
+  EXPECT_EQ(order.ColumnNames(), "title,year,author");
 }
 
 TEST_F(TranslatorTest, StoredDefinitionFormsSetCreateAndRebuild) {
@@ -56,14 +63,6 @@ TEST_F(TranslatorTest, ColumnWordsAreJoinedWithoutBlanksAcrossLines) {
   EXPECT_EQ(Refuse("CREATE FINDEX Books ON TABLE t COLUMNS title KEY = id").number, 13);
 }
 
-TEST_F(TranslatorTest, OrderColumnsKeepStatementOrder) {
-  Translate("CREATE ORDER ByTitle ON TABLE books COLUMNS title, year,author KEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdOrderDefined);
-  EXPECT_EQ(order.OrderName, "ByTitle");
-  EXPECT_EQ(order.KeyColumn, "id");
-  EXPECT_EQ(order.ColumnNames(), "title,year,author");
-}
-
 TEST_F(TranslatorTest, PassThroughSqlKeepsTheHostsText) {
   const std::string sql = "create index ix ON books (title)\n  WHERE kind = 'a = b' AND x = \"q";
   Translate(sql);
@@ -74,7 +73,7 @@ TEST_F(TranslatorTest, PassThroughSqlKeepsTheHostsText) {
   EXPECT_TRUE(cmd.PassThroughSql().empty());
 }
 
-TEST_F(TranslatorTest, ConnectTakesDsnUserAndPassword) {
+TEST_F(TranslatorTest, ConnectSetGroupAndConnectionString) {
   Translate("CONNECT books_dsn EMPTY s3cret extra");
   EXPECT_EQ(cmd.CmdType(), kCmdConnect);
   EXPECT_EQ(connection.UserId, "");
@@ -85,9 +84,7 @@ TEST_F(TranslatorTest, ConnectTakesDsnUserAndPassword) {
   EXPECT_EQ(connection.Dsn, "My Books");
   EXPECT_EQ(connection.UserId, "o\"brien");
   EXPECT_EQ(connection.Password, "");
-}
 
-TEST_F(TranslatorTest, SetGroupAndConnectionString) {
   Translate("SET GROUP Sales");
   EXPECT_EQ(cmd.CmdType(), kCmdSetGroup);
   EXPECT_EQ(connection.Group, "Sales");

@@ -6,14 +6,25 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <filesystem>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "api/command_fixture.h"
 #include "test_sources.h"
 
 namespace qm::test {
+
+// Waits until the command object's background job has ended.
+inline void WaitForJob(APICommand& command) {
+  int32_t progress = -1;
+  for (int i = 0; i < 60000 && command.GetProgress(&progress) == S_OK && progress != 100; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  ASSERT_EQ(progress, 100) << "the background job did not end";
+}
 
 class DataSourceTest : public CommandFixture, public ::testing::WithParamInterface<Source> {
  protected:
@@ -69,20 +80,28 @@ class DataSourceTest : public CommandFixture, public ::testing::WithParamInterfa
     return name;
   }
 
-  // Rows id, "w<id>a w<id>b w<id>c": three distinct words each.
-  void AddWordRows(const std::string& table, int from, int to) {
+  // Inserts rows (each "value, value, ...") in batches.
+  void Insert(const std::string& table, const std::vector<std::string>& rows) {
     std::vector<std::string> statements;
     std::string values;
-    for (int id = from; id <= to; ++id) {
-      const std::string w = "w" + std::to_string(id);
-      if (!values.empty()) values += ",";
-      values += "(" + std::to_string(id) + ",'" + w + "a " + w + "b " + w + "c')";
-      if (id % 200 == 0 || id == to) {
+    for (std::size_t i = 0; i < rows.size(); ++i) {
+      values += (values.empty() ? "(" : ",(") + rows[i] + ")";
+      if ((i + 1) % 200 == 0 || i + 1 == rows.size()) {
         statements.push_back("insert into " + table + " values " + values);
         values.clear();
       }
     }
     OnSource(statements);
+  }
+
+  // Rows id, "w<id>a w<id>b w<id>c": three distinct words each.
+  static std::vector<std::string> WordRows(int32_t from, int32_t to) {
+    std::vector<std::string> rows;
+    for (int32_t id = from; id <= to; ++id) {
+      const std::string w = (id < 0 ? "wm" : "w") + std::to_string(id < 0 ? -id : id);
+      rows.push_back(std::to_string(id) + ", '" + w + "a " + w + "b " + w + "c'");
+    }
+    return rows;
   }
 
   std::string Info(const std::string& findex, int32_t value) {

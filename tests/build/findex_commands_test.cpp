@@ -1,17 +1,15 @@
 // The engine's work on existing findexes and orders, given as header files:
-// information values, existence, stored options, the update decision between
-// a rebuild and an add-on findex, the option check, and drops with their locks.
+// information values summed over add-ons, existence, stored options, the
+// option check of updates, and drops waiting for their locks.
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <chrono>
 #include <filesystem>
 #include <thread>
 
-#include "api/command_fixture.h"
+#include "build/data_source_fixture.h"
 #include "build/command_locks.h"
 #include "build/command_type.h"
-#include "build/deleted_keys.h"
 #include "locks/lock_manager.h"
 #include "shared/bfile.h"
 #include "shared/index_header.h"
@@ -69,13 +67,6 @@ class FindexCommandsTest : public CommandFixture {
 
   // The decision the engine took for the last findex command, as it traced it.
   bool Traced(std::string_view line) const { return TraceText().find(line) != std::string::npos; }
-
-  void WaitForJob() {
-    for (int i = 0; i < 60000 && Progress() != 100; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    ASSERT_EQ(Progress(), 100) << "the background job did not end";
-  }
 };
 
 TEST_F(FindexCommandsTest, EveryInformationValue) {
@@ -98,30 +89,23 @@ TEST_F(FindexCommandsTest, EveryInformationValue) {
   // The walk stops at the first missing add-on: number 4 is never counted.
   WriteFindex("BOOKS_ADD_4", Books(100000, 1));
 
-  // Any case of the name finds the upper-cased files.
+  // Any case of the name finds the upper-cased files; counts add up the
+  // add-ons, texts are lower-cased.
   ASSERT_EQ(command_->SetCurrentObjectName(T("books")), S_OK);
-  EXPECT_EQ(Info(idxTableName), "books");
-  EXPECT_EQ(Info(idxColumnNames), "body,title");
-  EXPECT_EQ(Info(idxKeyName), "id");
   EXPECT_EQ(Info(idxTypeName), "Text (Ansi)");
-  EXPECT_EQ(Info(idxType), "2");
   EXPECT_EQ(Info(idxWordCount), "5510");
   EXPECT_EQ(Info(idxDistinctWordCount), "14");
   EXPECT_EQ(Info(idxKeyCount), "15");
   EXPECT_EQ(Info(idxFracmentationLevel), "2");
-  EXPECT_EQ(Info(idxVersion), "6.14");
   EXPECT_EQ(Info(idxSQLUsedAsTable), "Yes");
   EXPECT_EQ(Info(idxSQLSelect), "select id, title from books where shelf = 'a'");
   EXPECT_EQ(Info(idxDBConnectionString), "Driver=SQLite3;Database=/x/Books.db;");
   EXPECT_EQ(Info(idxDBDisplayName), "my books");
   EXPECT_EQ(Info(idxBuildTime), "2024-3-9 14:5:7");
   EXPECT_EQ(Info(idxLastUpdateTime), "2025-12-31 23:59:58");
-  EXPECT_EQ(Info(idxIndexMaxSize), "");
-  EXPECT_EQ(Info(idxIndexStartValue), "");
   EXPECT_EQ(Info(4), "");
-}
 
-TEST_F(FindexCommandsTest, TypesWithoutAWordSourceAndAnUnsavedConnection) {
+  // Types without a word source; a connection that was not saved.
   ASSERT_EQ(command_->SetCurrentObjectName(T("Typed")), S_OK);
   for (const auto& [type, name] : {std::pair{4, "Text (Unicode)"}, {0, "Error"}, {5, "Error"}}) {
     CIndexHeader h = Books(1, 1);
@@ -223,26 +207,6 @@ TEST_F(FindexCommandsTest, OrderInformationIsLowerCased) {
   EXPECT_EQ(text, u"1");
 }
 
-TEST_F(FindexCommandsTest, LargeFindexTakesItsNewRowsIntoTheFirstAddOnWithRoom) {
-  WriteFindex("BOOKS", Books(2000, 500));
-  Run("UPDATE FINDEX Books");
-  EXPECT_TRUE(Traced("Status 2. IndexBuildName: BOOKS_ADD_1, Rebuild: 0, SortMax: 500"))
-      << TraceText();
-
-  // A full add-on 1 passes the rows above its own highest key to add-on 2.
-  WriteFindex("BOOKS_ADD_1", Books(2000, 800));
-  Run("UPDATE FINDEX Books");
-  EXPECT_TRUE(Traced("Status 2. IndexBuildName: BOOKS_ADD_2, Rebuild: 0, SortMax: 800"));
-
-  // An add-on with room is built again from the findex before it.
-  WriteFindex("BOOKS_ADD_2", Books(300, 950));
-  WriteFindex("BOOKS_ADD_1", Books(2500, 800));
-  Run("UPDATE FINDEX books ON TABLE books COLUMNS body,title:CONTENT_WEIGHT=3 KEY id");
-  const std::string traced = TraceText();
-  const std::string line = "Status 2. IndexBuildName: BOOKS_ADD_2, Rebuild: 0, SortMax: 800";
-  EXPECT_NE(traced.find(line), traced.rfind(line)) << "traced by both updates";
-}
-
 TEST_F(FindexCommandsTest, UpdateCannotAddScoreOrPhrasesTheFindexWasBuiltWithout) {
   CIndexHeader h = Books(5000, 10);
   h.GeneralFlags = 4 | 8;  // neither scores nor phrases
@@ -258,40 +222,6 @@ TEST_F(FindexCommandsTest, UpdateCannotAddScoreOrPhrasesTheFindexWasBuiltWithout
   // So does CREATE from the stored definition: a rebuild reads every row.
   Run("CREATE FINDEX Books");
   EXPECT_TRUE(Traced("Status 2. IndexBuildName: Books, Rebuild: 1, SortMax: 0"));
-}
-
-TEST_F(FindexCommandsTest, DeletedKeysGoToTheFindexsDeletedKeyFile) {
-  WriteFindex("BOOKS", Books(1, 1));
-  for (const char* statement : {"DELETE FROM FINDEX Books 30", "DELETE FROM FINDEX books 10",
-                                "DELETE FROM FINDEX BOOKS 20", "DELETE FROM FINDEX Books 10"}) {
-    EXPECT_EQ(Run(statement), "") << statement;
-  }
-  EXPECT_EQ(ReadDeletedKeys(Defs(), "Books"), (std::vector<int32_t>{10, 20, 30}));
-  const std::string text = Run("DELETE FROM FINDEX Bokks 5");
-  EXPECT_EQ(text.rfind("Cannot delete key 5: findex Bokks does not exist", 0), 0u) << text;
-  EXPECT_FALSE(fs::exists(IndexFolder() + "BOKKS.del"));
-}
-
-TEST_F(FindexCommandsTest, DropRemovesTheFindexWithItsAddOnsAndDeletedKeys) {
-  WriteFindex("BOOKS", Books(1, 1));
-  WriteFindex("BOOKS_ADD_1", Books(1, 2));
-  WriteFindex("BOOKS_ADD_2", Books(1, 3));
-  test::WriteFile(IndexFolder() + "BOOKS.del", std::string(8, '\0'));
-  WriteFindex("BOOKSHELF", Books(1, 1));
-
-  // An add-on goes only with its findex.
-  EXPECT_EQ(command_->DropFindex(T("Books_ADD_1")), DISP_E_EXCEPTION);
-  EXPECT_NE(LastError().find("cannot be dropped by itself"), std::string::npos) << LastError();
-  EXPECT_TRUE(fs::exists(IndexFolder() + "BOOKS_ADD_1.sdx"));
-
-  EXPECT_EQ(Run("DROP FINDEX books"), "");
-  std::vector<std::string> left;
-  for (const auto& entry : fs::directory_iterator(IndexFolder())) {
-    left.push_back(entry.path().filename().string());
-  }
-  std::sort(left.begin(), left.end());
-  EXPECT_EQ(left, (std::vector<std::string>{"BOOKSHELF.fst", "BOOKSHELF.sdx"}));
-  EXPECT_FALSE(Run("DROP FINDEX Books").empty()) << "nothing left to drop";
 }
 
 TEST_F(FindexCommandsTest, DropWaitsForBuildsAndSearchesOfTheFindex) {
@@ -311,7 +241,7 @@ TEST_F(FindexCommandsTest, DropWaitsForBuildsAndSearchesOfTheFindex) {
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   search.UnlockReaders();
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
   EXPECT_FALSE(fs::exists(IndexFolder() + "BOOKS.sdx"));
 }

@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <bit>
 #include <limits>
-#include <optional>
 
+#include "platform/text_encoding.h"
 #include "support/test_support.h"
 
 namespace qm::test {
@@ -21,10 +21,6 @@ uint64_t Get(const std::string& in, std::size_t at, int n) {
   uint64_t v = 0;
   for (int i = n - 1; i >= 0; --i) v = (v << 8) | static_cast<uint8_t>(in[at + i]);
   return v;
-}
-
-int32_t GetInt(const std::string& in, std::size_t at) {
-  return static_cast<int32_t>(Get(in, at, 4));
 }
 
 // The value encoding of the sorted entry file and of blocks (the same).
@@ -48,43 +44,6 @@ void Encode(std::string& out, const WordValue& value) {
   }
 }
 
-// A value of the type at pos, not past limit; nullopt when it would overrun.
-std::optional<WordValue> Decode(const std::string& in, std::size_t& pos, std::size_t limit,
-                                int32_t type) {
-  const std::size_t at = pos;
-  const bool text = type == 2 || type == 4;
-  const std::size_t n = text && at + 2 <= limit ? Get(in, at, 2) : 0;
-  const std::size_t size = type == 1   ? 4
-                           : type == 6 ? 8
-                           : type == 3 ? 16
-                           : type == 2 ? 2 + n
-                                       : 2 + 2 * n;
-  if (at + size > limit || (text && at + 2 > limit)) return std::nullopt;
-  pos += size;
-  switch (type) {
-    case 1:
-      return WordValue(GetInt(in, at));
-    case 6:
-      return WordValue(std::bit_cast<double>(Get(in, at, 8)));
-    case 2:
-      return WordValue(in.substr(at + 2, n));
-    case 4: {
-      std::u16string w;
-      for (std::size_t i = 0; i < n; ++i)
-        w.push_back(static_cast<char16_t>(Get(in, at + 2 + 2 * i, 2)));
-      return WordValue(w);
-    }
-    default: {
-      Date16 d{
-          static_cast<int16_t>(Get(in, at, 2)),      static_cast<uint16_t>(Get(in, at + 2, 2)),
-          static_cast<uint16_t>(Get(in, at + 4, 2)), static_cast<uint16_t>(Get(in, at + 6, 2)),
-          static_cast<uint16_t>(Get(in, at + 8, 2)), static_cast<uint16_t>(Get(in, at + 10, 2)),
-          static_cast<uint32_t>(Get(in, at + 12, 4))};
-      return WordValue(d);
-    }
-  }
-}
-
 class Decoder {
  public:
   Decoder(const std::string& sdx_path, const std::string& fst_path, int32_t type, int32_t flags,
@@ -97,15 +56,13 @@ class Decoder {
 
   void Run() {
     if (sdx_.size() < kBlock) return Fault("no header block");
-    out_.block_num = GetInt(sdx_, 10);
-    if (GetInt(sdx_, 14) != 614 || sdx_.substr(18, 6) != std::string("\x04\x00"
-                                                                     "6.14",
-                                                                     6))
+    out_.block_num = LoadInt32(sdx_, 10);
+    if (LoadInt32(sdx_, 14) != 614 || sdx_.substr(18, 6) != std::string("\x04\x00" "6.14", 6))
       Fault("version");
-    if (GetInt(sdx_, 24) != 1) Fault("build state");
-    out_.findex_type = GetInt(sdx_, 28);
-    if (sdx_.size() != static_cast<std::size_t>(out_.block_num) * kBlock)
-      Fault("size is not BlockNum blocks");
+    if (LoadInt32(sdx_, 24) != 1) Fault("build state");
+    out_.findex_type = LoadInt32(sdx_, 28);
+    if (out_.block_num < 1 || sdx_.size() != static_cast<std::size_t>(out_.block_num) * kBlock)
+      return Fault("size is not BlockNum blocks");
     if (out_.block_num < 2) {
       if (!fst_.empty()) Fault("postings without words");
       return;
@@ -154,10 +111,10 @@ class Decoder {
       out_.leaves.push_back(block);
       auto& values = out_.leaf_values[block];
       while (pos < limit) {
-        auto value = Decode(sdx_, pos, limit, type_);
+        auto value = DecodeValue(sdx_, pos, limit, type_);
         if (!value || pos + 4 > limit) return Fault("leaf row cut" + where), std::nullopt;
         if (!out_.words.empty() && !(out_.words.back().value < *value)) Fault("order" + where);
-        positions_.push_back(GetInt(sdx_, pos));
+        positions_.push_back(LoadInt32(sdx_, pos));
         pos += 4;
         out_.words.push_back(Word{*value, {}});
         values.push_back(*value);
@@ -168,10 +125,10 @@ class Decoder {
     DecodedNode node;
     while (pos < limit) {
       if (pos + 4 > limit) return Fault("child cut" + where), std::nullopt;
-      node.children.push_back(GetInt(sdx_, pos));
+      node.children.push_back(LoadInt32(sdx_, pos));
       pos += 4;
       if (pos == limit) break;
-      auto separator = Decode(sdx_, pos, limit, type_);
+      auto separator = DecodeValue(sdx_, pos, limit, type_);
       if (!separator) return Fault("separator cut" + where), std::nullopt;
       node.separators.push_back(*separator);
     }
@@ -189,6 +146,8 @@ class Decoder {
     return highest;
   }
 
+  // The posting lists lie back to back in word order: a count row (count of
+  // rows including itself, other columns 0), then the postings.
   void ReadPostings() {
     const std::size_t row = 4 * static_cast<std::size_t>(width_);
     std::size_t cursor = 0;
@@ -196,16 +155,16 @@ class Decoder {
       const auto position = static_cast<std::size_t>(static_cast<uint32_t>(positions_[w]));
       if (position != cursor) return Fault("lists not back to back at word " + std::to_string(w));
       if (position + row > fst_.size()) return Fault("count row past the end");
-      const int32_t count = GetInt(fst_, position);
+      const int32_t count = LoadInt32(fst_, position);
       for (int32_t c = 1; c < width_; ++c) {
-        if (GetInt(fst_, position + 4 * c) != 0) Fault("count row column not 0");
+        if (LoadInt32(fst_, position + 4 * c) != 0) Fault("count row column not 0");
       }
       cursor = position + row * static_cast<std::size_t>(std::max(count, 1));
       if (count < 2 || cursor > fst_.size()) return Fault("bad count " + std::to_string(count));
       for (int32_t r = 1; r < count; ++r) {
         Posting posting;
         for (int32_t c = 0; c < width_; ++c)
-          posting.push_back(GetInt(fst_, position + row * r + 4 * c));
+          posting.push_back(LoadInt32(fst_, position + row * r + 4 * c));
         out_.words[w].postings.push_back(std::move(posting));
       }
     }
@@ -224,6 +183,35 @@ class Decoder {
 
 }  // namespace
 
+int32_t LoadInt32(const std::string& in, std::size_t at) {
+  return static_cast<int32_t>(Get(in, at, 4));
+}
+
+std::optional<WordValue> DecodeValue(const std::string& in, std::size_t& pos, std::size_t limit,
+                                     int32_t type) {
+  if (type < 1 || type > 6 || type == 5) return std::nullopt;
+  const std::size_t at = pos;
+  const bool text = type == 2 || type == 4;
+  if (text && at + 2 > limit) return std::nullopt;
+  const std::size_t n = text ? Get(in, at, 2) : 0;
+  const std::size_t size = type == 1 ? 4 : type == 6 ? 8 : type == 3 ? 16 : 2 + n * (type / 2);
+  if (at + size > limit) return std::nullopt;
+  pos += size;
+  switch (type) {
+    case 1: return WordValue(LoadInt32(in, at));
+    case 6: return WordValue(std::bit_cast<double>(Get(in, at, 8)));
+    case 2: return WordValue(in.substr(at + 2, n));
+    case 4: {
+      std::u16string w;
+      for (std::size_t i = 0; i < n; ++i) w.push_back(static_cast<char16_t>(Get(in, at + 2 + 2 * i, 2)));
+      return WordValue(w);
+    }
+  }
+  auto part = [&](int i) { return static_cast<uint16_t>(Get(in, at + 2 * i, 2)); };
+  return WordValue(Date16{static_cast<int16_t>(part(0)), part(1), part(2), part(3), part(4),
+                          part(5), static_cast<uint32_t>(Get(in, at + 12, 4))});
+}
+
 void PrintTo(const Word& word, std::ostream* out) {
   if (const auto* s = std::get_if<std::string>(&word.value)) *out << '"' << *s << '"';
   *out << "(value " << word.value.index() << ") with " << word.postings.size() << " postings";
@@ -232,6 +220,17 @@ void PrintTo(const Word& word, std::ostream* out) {
 int32_t TypeCode(const WordValue& value) {
   constexpr int32_t kCodes[] = {1, 2, 3, 4, 6};
   return kCodes[value.index()];
+}
+
+std::string WordText(const WordValue& v) {
+  if (const auto* s = std::get_if<std::string>(&v)) return *s;
+  if (const auto* w = std::get_if<std::u16string>(&v)) return Utf16ToUtf8(*w);
+  if (const auto* i = std::get_if<int32_t>(&v)) return std::to_string(*i);
+  if (const auto* d = std::get_if<double>(&v)) return std::to_string(*d);
+  const auto& t = std::get<Date16>(v);
+  return std::to_string(t.year) + "-" + std::to_string(t.month) + "-" + std::to_string(t.day) +
+         " " + std::to_string(t.hour) + ":" + std::to_string(t.minute) + ":" +
+         std::to_string(t.second);
 }
 
 void WriteSortedFile(const std::string& path, const std::vector<Entry>& entries, int32_t flags) {

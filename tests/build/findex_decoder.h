@@ -7,6 +7,7 @@
 #include <compare>
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <variant>
@@ -25,6 +26,8 @@ struct Date16 {
 // UnicodeString (4), Double (6), in this order of alternatives.
 using WordValue = std::variant<int32_t, std::string, Date16, std::u16string, double>;
 int32_t TypeCode(const WordValue& value);
+// A value as text: text as UTF-8, numbers by std::to_string, dates "Y-M-D h:m:s".
+std::string WordText(const WordValue& value);
 
 struct Entry {
   WordValue value;
@@ -34,6 +37,13 @@ struct Entry {
 };
 
 using Posting = std::vector<int32_t>;  // key, [weight], [position]
+
+// A little-endian 32-bit integer at at.
+int32_t LoadInt32(const std::string& in, std::size_t at);
+// The value of the type code (1, 2, 3, 4, 6) at pos, moving pos past it;
+// nullopt, pos unmoved, when it would pass limit.
+std::optional<WordValue> DecodeValue(const std::string& in, std::size_t& pos, std::size_t limit,
+                                     int32_t type);
 
 struct Word {
   WordValue value;

@@ -191,7 +191,7 @@ TEST_F(FindexFilesTest, LongPostingListsGoInBatchesWithTheCountPatchedIn) {
   EXPECT_EQ(findex.words[0].postings.size(), 20000u);
 }
 
-TEST_F(FindexFilesTest, TreeAndPostingLimitsRaiseInsteadOfWritingWrongNumbers) {
+TEST_F(FindexFilesTest, TreeAndPostingLimitsAndDisorderRaiseInsteadOfWritingWrongFiles) {
   // Values of 2,000 bytes: two per leaf and per node, so the root is full
   // after eight leaves.
   EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(LongWords(40, 2000), 0); }).number, 29);
@@ -217,11 +217,9 @@ TEST_F(FindexFilesTest, TreeAndPostingLimitsRaiseInsteadOfWritingWrongNumbers) {
   Write(LongWords(300, 10), 0, 2, bytes);
   Write(LongWords(300, 400), 0, 2, blocks);
   EXPECT_EQ(Decode(0).faults, std::vector<std::string>{});
-}
 
-TEST_F(FindexFilesTest, EntriesOutOfOrderAreRefused) {
-  const std::vector<Entry> entries = {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}};
-  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(entries, 0); }).text,
+  const std::vector<Entry> unsorted = {{std::string("b"), 1, 1, 1}, {std::string("a"), 1, 1, 1}};
+  EXPECT_EQ(test::Raised<CPiFIndexException>([&] { Write(unsorted, 0); }).text,
             "Sorted entry file out of order at entry 2 (Module:PiFIndex,Method:BuildRowFindex)");
 }
 

@@ -38,21 +38,6 @@ constexpr std::string_view kNoRows = "No rows were selected for the findex";
 
 class FindexUpdateTest : public test::DataSourceTest {
  protected:
-  // Inserts rows (each "value, value, ...") in batches.
-  void Insert(const std::string& table, const std::vector<std::string>& rows) {
-    std::vector<std::string> statements;
-    std::string values;
-    for (std::size_t i = 0; i < rows.size(); ++i) {
-      if (!values.empty()) values += ",";
-      values += "(" + rows[i] + ")";
-      if ((i + 1) % 200 == 0 || i + 1 == rows.size()) {
-        statements.push_back("insert into " + table + " values " + values);
-        values.clear();
-      }
-    }
-    OnSource(statements);
-  }
-
   // The header of a findex (or add-on), read from its .sdx.
   CIndexHeader Header(const std::string& upper_name) const {
     BFile sdx;
@@ -92,15 +77,12 @@ class FindexUpdateTest : public test::DataSourceTest {
   // The deleted-key file's keys, decoded from its documented layout.
   std::vector<int32_t> DeletedKeys(const std::string& upper_name) const {
     const std::string bytes = test::ReadFile(IndexFolder() + upper_name + ".del");
-    auto at = [&](std::size_t offset) {
-      uint32_t v = 0;
-      for (int i = 3; i >= 0; --i) v = (v << 8) | static_cast<uint8_t>(bytes.at(offset + i));
-      return static_cast<int32_t>(v);
-    };
-    const int32_t count = at(0);
-    EXPECT_EQ(bytes.size(), 4 + 4 * static_cast<std::size_t>(count));
     std::vector<int32_t> keys;
-    for (int32_t i = 0; i < count; ++i) keys.push_back(at(4 + 4 * static_cast<std::size_t>(i)));
+    if (bytes.size() < 4 || bytes.size() != 4 + 4 * static_cast<uint32_t>(test::LoadInt32(bytes, 0))) {
+      ADD_FAILURE() << "a .del of " << bytes.size() << " bytes";
+      return keys;
+    }
+    for (std::size_t at = 4; at < bytes.size(); at += 4) keys.push_back(test::LoadInt32(bytes, at));
     return keys;
   }
 
@@ -128,24 +110,7 @@ class FindexUpdateTest : public test::DataSourceTest {
   // A findex name of this process alone: lock names are shared by every
   // process, and these tests hold a findex's locks while other tests run.
   static std::string HeldName() { return "Held" + std::to_string(getpid()); }
-
-  void WaitForJob() {
-    for (int i = 0; i < 60000 && Progress() != 100; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    ASSERT_EQ(Progress(), 100) << "the background job did not end";
-  }
 };
-
-// Rows id, "w<id>a w<id>b w<id>c": three words each.
-std::vector<std::string> WordRows(int32_t from, int32_t to) {
-  std::vector<std::string> rows;
-  for (int32_t id = from; id <= to; ++id) {
-    const std::string w = (id < 0 ? "wm" : "w") + std::to_string(std::abs(id));
-    rows.push_back(std::to_string(id) + ", '" + w + "a " + w + "b " + w + "c'");
-  }
-  return rows;
-}
 
 TEST_P(FindexUpdateTest, WordCountThresholdsChooseARebuildOrTheFirstAddOnWithRoom) {
   // 1,999 words: an update rebuilds the findex whole and forgets its deleted keys.
@@ -208,6 +173,21 @@ TEST_P(FindexUpdateTest, WordCountThresholdsChooseARebuildOrTheFirstAddOnWithRoo
   for (const char* file : {"BIG.del", "BIG_ADD_1.sdx", "BIG_ADD_1.fst", "BIG_ADD_2.sdx"}) {
     EXPECT_FALSE(Exists(file)) << file;
   }
+
+  // A drop takes the findex with its add-ons and deleted keys; an add-on
+  // goes only with its findex.
+  Insert(big, WordRows(1340, 1342));
+  ASSERT_EQ(Run("UPDATE FINDEX Big"), "");
+  ASSERT_EQ(Run("DELETE FROM FINDEX Big 3"), "");
+  EXPECT_EQ(command_->DropFindex(T("Big_ADD_1")), DISP_E_EXCEPTION);
+  EXPECT_NE(LastError().find("cannot be dropped by itself"), std::string::npos) << LastError();
+  ASSERT_TRUE(Exists("BIG_ADD_1.sdx") && Exists("BIG.del"));
+  ASSERT_EQ(Run("DROP FINDEX Big"), "");
+  for (const char* file : {"BIG.sdx", "BIG.fst", "BIG.del", "BIG_ADD_1.sdx", "BIG_ADD_1.fst"}) {
+    EXPECT_FALSE(Exists(file)) << file;
+  }
+  EXPECT_TRUE(Exists("SMALL.sdx"));
+  EXPECT_FALSE(Run("DROP FINDEX Big").empty()) << "nothing left to drop";
 }
 
 TEST_P(FindexUpdateTest, RebuildsReadEveryRowAndMustFindRows) {
@@ -296,12 +276,9 @@ TEST_P(FindexUpdateTest, AddOnsAreBuiltWithTheStoredDefinitionAndOptions) {
   // Stemmed, with the body's weight: (word, key, weight) of each posting.
   std::vector<std::tuple<std::string, int32_t, int32_t>> postings;
   for (const test::Word& word : decoded.words) {
-    const auto* wide = std::get_if<std::u16string>(&word.value);
-    const auto* narrow = std::get_if<std::string>(&word.value);
-    ASSERT_TRUE(wide != nullptr || narrow != nullptr) << "a word that is not text";
     for (const test::Posting& p : word.postings) {
       ASSERT_EQ(p.size(), 3u) << "key, weight and position";
-      postings.emplace_back(wide != nullptr ? Utf16ToUtf8(*wide) : *narrow, p[0], p[1]);
+      postings.emplace_back(test::WordText(word.value), p[0], p[1]);
     }
   }
   EXPECT_EQ(postings, (std::vector<std::tuple<std::string, int32_t, int32_t>>{{"FRESH", 701, 2},
@@ -442,6 +419,9 @@ TEST_P(FindexUpdateTest, DeletesInAnyOrderLeaveASortedListWithoutDuplicates) {
             0u)
       << text;
   EXPECT_EQ(Snapshot({"ROWS.del"}), before);
+  const std::string missing = Run("DELETE FROM FINDEX Rowz 5");
+  EXPECT_EQ(missing.rfind("Cannot delete key 5: findex Rowz does not exist", 0), 0u) << missing;
+  EXPECT_FALSE(Exists("ROWZ.del"));
 }
 
 TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
@@ -463,7 +443,7 @@ TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   search.UnlockReaders();
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
   EXPECT_EQ(Keys(add_on), Range(701, 703));
 }
@@ -489,13 +469,9 @@ TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
     std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
   search.UnlockReaders();
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
-  int32_t progress = 0;
-  for (int i = 0; i < 60000 && progress != 100; ++i) {
-    ASSERT_EQ(deleter.GetProgress(&progress), S_OK);
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-  }
+  test::WaitForJob(deleter);
   int32_t failed = -1;
   ASSERT_EQ(deleter.GetErrorNumber(&failed), S_OK);
   EXPECT_EQ(failed, 0);

@@ -1,15 +1,14 @@
 // Orders built from real data sources through the command object: SQLite
 // always, PostgreSQL through the ANSI and the Unicode driver when the test
-// services run. CREATE, UPDATE and DROP ORDER statements, CreateOrder and
-// CreateOrderEx, the stored options, every information value, date/time key
-// updates and background builds.
+// services run. Type 1 and type 2 orders read back with the decoder of
+// order_file_decoder.h, the stored options, every information value,
+// updates by key and by date/time key, drops and background builds.
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <chrono>
+#include <bit>
 #include <filesystem>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "data_source_fixture.h"
@@ -23,8 +22,12 @@ namespace fs = std::filesystem;
 
 using Entries = std::vector<test::ColumnEntry>;
 using Rows = std::vector<std::vector<int32_t>>;
-
 using test::Source;
+
+constexpr int32_t kNull = 2147483647;
+
+int32_t Low(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v)); }
+int32_t High(double v) { return static_cast<int32_t>(std::bit_cast<uint64_t>(v) >> 32); }
 
 class OrderEndToEndTest : public test::DataSourceTest {
  protected:
@@ -40,40 +43,39 @@ class OrderEndToEndTest : public test::DataSourceTest {
 
   std::vector<std::string> OrderFiles() const {
     std::vector<std::string> names;
-    for (const auto& e : fs::directory_iterator(OrderFolder()))
-      names.push_back(e.path().filename());
+    for (const auto& e : fs::directory_iterator(OrderFolder())) names.push_back(e.path().filename());
     std::sort(names.begin(), names.end());
     return names;
   }
 
-  // The value type code the header of order records for column (both upper-cased).
-  int32_t ColumnType(const std::string& order, const std::string& column) {
-    for (const auto& c : test::DecodeOrderHeader(OrderFolder() + order + ".sri").columns) {
+  test::OrderHeader Header(const std::string& order) const {
+    return test::DecodeOrderHeader(OrderFolder() + order + ".sri");
+  }
+
+  // The value type code the header records for column (upper-cased).
+  int32_t ColumnType(const std::string& order, const std::string& column) const {
+    for (const auto& c : Header(order).columns) {
       if (ToUpper(c.name) == column) return c.type;
     }
     ADD_FAILURE() << "order " << order << " has no column " << column;
     return 0;
   }
 
-  // The column file, read in the value type the header records.
-  Entries Column(const std::string& order, const std::string& column) {
+  // The column file, read in the value type its header records.
+  Entries Column(const std::string& order, const std::string& column) const {
     return test::DecodeColumnFile(OrderFolder() + order + "_" + column + ".col",
                                   ColumnType(order, column));
   }
 
-  // Only the Unicode PostgreSQL driver describes text columns as wide.
-  int32_t TextType() const { return GetParam() == Source::PostgresUnicode ? 4 : 2; }
-
-  Rows RowsOf(const std::string& order, int width) {
+  // The rows of the .srt, as wide as the header's columns say.
+  Rows RowsOf(const std::string& order) const {
+    int width = 1;
+    for (const auto& c : Header(order).columns) width += c.slots;
     return test::DecodeOrderRows(OrderFolder() + order + ".srt", width);
   }
 
-  void WaitForJob() {
-    for (int i = 0; i < 60000 && Progress() != 100; ++i) {
-      std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    ASSERT_EQ(Progress(), 100) << "the background job did not end";
-  }
+  // Only the Unicode PostgreSQL driver describes text columns as wide.
+  int32_t TextType() const { return GetParam() == Source::PostgresUnicode ? 4 : 2; }
 };
 
 INSTANTIATE_TEST_SUITE_P(Sources, OrderEndToEndTest,
@@ -81,22 +83,60 @@ INSTANTIATE_TEST_SUITE_P(Sources, OrderEndToEndTest,
                                            Source::PostgresUnicode),
                          test::SourceName);
 
-TEST_P(OrderEndToEndTest, CreateOrderWithTheCurrentOptionsAndEveryInformationValue) {
-  const std::string books = Table("books", "id integer, title varchar(100), year integer",
-                                  {"1, '-River', 1999", "2, 'river-', 2004", "3, 'Lake', NULL"});
-  ASSERT_EQ(command_->SetOrderGeneralOptions(VARIANT_TRUE, VARIANT_TRUE, T("-")), S_OK);
-  ASSERT_EQ(Run("CREATE ORDER Titles ON TABLE " + books + " COLUMNS title, year KEY id"), "");
+TEST_P(OrderEndToEndTest, NumbersAndDatesMakeType1OrdersWithNullsAsTheHighestValue) {
+  const std::string t =
+      Table("prices", "id integer, n integer, r double precision, d timestamp",
+            {"3, 7, 2.5, '2024-02-29 13:45:59'", "1, NULL, -1.25, NULL",
+             "2, -4, NULL, '1999-12-31 23:59:58'"});
+  ASSERT_EQ(Run("CREATE ORDER Prices ON TABLE " + t + " COLUMNS n, r, d KEY id"), "");
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"PRICES.sri", "PRICES.srt"}));
+  const test::OrderHeader h = Header("PRICES");
+  EXPECT_EQ(h.version, 614);
+  EXPECT_EQ(h.type, 1);
+  EXPECT_EQ(h.name, "Prices");
+  EXPECT_EQ(h.count, 3);
+  EXPECT_EQ(h.sort_max, 3);
+  Rows layout;  // type, first slot, slots of each column
+  for (const auto& c : h.columns) layout.push_back({c.type, c.first, c.slots});
+  EXPECT_EQ(layout, (Rows{{1, 1, 1}, {6, 2, 2}, {3, 4, 2}}));
+  // A double takes its low then high half, a date/time its date then time key.
+  const auto date = [](int y, int m, int d) { return (y * 256 + m) * 256 + d; };
+  EXPECT_EQ(RowsOf("PRICES"),
+            (Rows{{1, kNull, Low(-1.25), High(-1.25), kNull, 0},
+                  {2, -4, kNull, 0, date(1999, 12, 31), date(23, 59, 58)},
+                  {3, 7, Low(2.5), High(2.5), date(2024, 2, 29), date(13, 45, 59)}}));
+  EXPECT_EQ(Info("Prices", odrTypeName), "integer");
 
-  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"TITLES.sri", "TITLES.srt", "TITLES_TITLE.col",
-                                                    "TITLES_YEAR.col"}));
+  // The API's form: the SQL is the table, stored lower-cased.
+  ASSERT_EQ(command_->CreateOrder(T("Years"), T("SELECT id, n FROM " + t), T("n"), T("id")), S_OK)
+      << LastError();
+  EXPECT_EQ(Info("Years", odrSQLUsedAsTable), "yes");
+  EXPECT_EQ(Info("Years", odrSQLSelect), "select id, n from " + t);
+  EXPECT_EQ(Info("Years", odrDBConnectionString), "") << "not saved unless asked";
+  EXPECT_EQ(RowsOf("YEARS"), (Rows{{1, kNull}, {2, -4}, {3, 7}}));
+  EXPECT_TRUE(fs::is_empty(GroupFolder() + "WorkData"));
+}
+
+TEST_P(OrderEndToEndTest, TextMakesType2OrdersOfRanksWithTheStoredOptionsAndEveryInformationValue) {
+  const std::string books =
+      Table("books", "id integer, title varchar(100), n integer",
+            {"1, '-River', 10", "2, 'river-', 9", "3, 'Lake', NULL", "4, NULL, -3", "5, 'la-ke', 10"});
+  ASSERT_EQ(command_->SetOrderGeneralOptions(VARIANT_TRUE, VARIANT_TRUE, T("-")), S_OK);
+  ASSERT_EQ(Run("CREATE ORDER Titles ON TABLE " + books + " COLUMNS title, n KEY id"), "");
+
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"TITLES.sri", "TITLES.srt", "TITLES_N.col",
+                                                    "TITLES_TITLE.col"}));
   EXPECT_EQ(ColumnType("TITLES", "TITLE"), TextType());
-  EXPECT_EQ(ColumnType("TITLES", "YEAR"), 1);
-  EXPECT_EQ(Column("TITLES", "TITLE"), (Entries{{"LAKE", {3}}, {"RIVER", {1, 2}}}));
-  EXPECT_EQ(Column("TITLES", "YEAR"), (Entries{{"1999", {1}}, {"2004", {2}}}));
-  EXPECT_EQ(RowsOf("TITLES", 3), (Rows{{1, 1, 0}, {2, 1, 1}, {3, 0, 2147483647}}));
+  // Case folded, ignore characters trimmed from the ends only; numbers keep
+  // their type and sort as numbers; a NULL has no entry and the highest rank.
+  EXPECT_EQ(Column("TITLES", "TITLE"), (Entries{{"LA-KE", {5}}, {"LAKE", {3}}, {"RIVER", {1, 2}}}));
+  EXPECT_EQ(ColumnType("TITLES", "N"), 1);
+  EXPECT_EQ(Column("TITLES", "N"), (Entries{{"-3", {4}}, {"9", {2}}, {"10", {1, 5}}}));
+  EXPECT_EQ(RowsOf("TITLES"),
+            (Rows{{1, 2, 2}, {2, 2, 1}, {3, 1, kNull}, {4, kNull, 0}, {5, 0, 2}}));
 
   EXPECT_EQ(Info("Titles", odrTableName), books);
-  EXPECT_EQ(Info("Titles", odrColumnNames), "title,year");
+  EXPECT_EQ(Info("Titles", odrColumnNames), "title,n");
   EXPECT_EQ(Info("Titles", odrKeyName), "id");
   EXPECT_EQ(Info("titles", odrTypeName), "text");
   EXPECT_EQ(Info("Titles", odrType), "2");
@@ -112,36 +152,26 @@ TEST_P(OrderEndToEndTest, CreateOrderWithTheCurrentOptionsAndEveryInformationVal
 
   // The options it was built with, as stored.
   BSTR text;
+  ASSERT_EQ(command_->SetOrderGeneralOptions(VARIANT_FALSE, VARIANT_FALSE, nullptr), S_OK);
   ASSERT_EQ(command_->GetOrderGeneralOption(ogoIgnorreCase, VARIANT_FALSE, &text), S_OK);
   EXPECT_EQ(Utf16ToUtf8(text), "1");
   ASSERT_EQ(command_->GetOrderGeneralOption(ogoIgnoreChars, VARIANT_FALSE, &text), S_OK);
   EXPECT_EQ(Utf16ToUtf8(text), "-");
-
-  // The API's form: the SQL is the table; numbers alone make type 1.
-  ASSERT_EQ(command_->SetOrderGeneralOptions(VARIANT_FALSE, VARIANT_FALSE, nullptr), S_OK);
-  ASSERT_EQ(
-      command_->CreateOrder(T("Years"), T("SELECT id, year FROM " + books), T("year"), T("id")),
-      S_OK)
-      << LastError();
-  EXPECT_EQ(Info("Years", odrTypeName), "integer");
-  EXPECT_EQ(Info("Years", odrSQLUsedAsTable), "yes");
-  EXPECT_EQ(Info("Years", odrSQLSelect), "select id, year from " + books);
-  EXPECT_EQ(Info("Years", odrDBConnectionString), "");
-  EXPECT_EQ(RowsOf("YEARS", 2), (Rows{{1, 1999}, {2, 2004}, {3, 2147483647}}));
 }
 
-TEST_P(OrderEndToEndTest, UpdatesMergeRefuseOtherDefinitionsAndRebuildsStartOver) {
+TEST_P(OrderEndToEndTest, UpdatesByKeyMergeRefuseOtherDefinitionsAndRebuildsStartOver) {
   const std::string t =
       Table("t", "id integer, title varchar(20), n integer", {"1, 'pear', 5", "2, 'apple', 3"});
   ASSERT_EQ(Run("CREATE ORDER Fruit ON TABLE " + t + " COLUMNS title,n KEY id"), "");
-  OnSource({"insert into " + t + " values (3, 'fig', 1)"});
+  // Key 1 is not read again: only keys past the highest one are.
+  OnSource({"insert into " + t + " values (3, 'fig', 1)",
+            "update " + t + " set title = 'plum' where id = 1"});
   ASSERT_EQ(Run("UPDATE ORDER Fruit"), "");  // the stored definition
   OnSource({"insert into " + t + " values (4, 'apple', 9)"});
   ASSERT_EQ(Run("UPDATE ORDER Fruit ON TABLE " + t + " COLUMNS title,n KEY id"), "");
   EXPECT_EQ(ColumnType("FRUIT", "TITLE"), TextType());
-  EXPECT_EQ(Column("FRUIT", "TITLE"),
-            (Entries{{"apple", {2, 4}}, {"fig", {3}}, {"pear", {1}}}));
-  EXPECT_EQ(RowsOf("FRUIT", 3), (Rows{{1, 2, 2}, {2, 0, 1}, {3, 1, 0}, {4, 0, 3}}));
+  EXPECT_EQ(Column("FRUIT", "TITLE"), (Entries{{"apple", {2, 4}}, {"fig", {3}}, {"pear", {1}}}));
+  EXPECT_EQ(RowsOf("FRUIT"), (Rows{{1, 2, 2}, {2, 0, 1}, {3, 1, 0}, {4, 0, 3}}));
 
   const std::string changed = Run("UPDATE ORDER Fruit ON TABLE " + t + " COLUMNS n KEY id");
   EXPECT_NE(changed.find("Order definition changed, rebuild required"), std::string::npos)
@@ -151,32 +181,47 @@ TEST_P(OrderEndToEndTest, UpdatesMergeRefuseOtherDefinitionsAndRebuildsStartOver
   EXPECT_EQ(Info("Fruit", odrTypeName), "integer");
   OnSource({"update " + t + " set n = 50 where id = 1"});
   ASSERT_EQ(Run("CREATE ORDER Fruit"), "");  // a rebuild from the stored definition
-  EXPECT_EQ(RowsOf("FRUIT", 2), (Rows{{1, 50}, {2, 3}, {3, 1}, {4, 9}}));
+  EXPECT_EQ(RowsOf("FRUIT"), (Rows{{1, 50}, {2, 3}, {3, 1}, {4, 9}}));
 
-  const std::string missing = Run("UPDATE ORDER Nothing");
-  EXPECT_FALSE(missing.empty());
+  EXPECT_FALSE(Run("UPDATE ORDER Nothing").empty());
   EXPECT_FALSE(fs::exists(OrderFolder() + "NOTHING.sri"));
 }
 
-TEST_P(OrderEndToEndTest, DateTimeKeyUpdatesReadOnlyLaterRows) {
-  const std::string t =
-      Table("dated", "id integer, title varchar(20), changed timestamp",
-            {"1, 'old', '2024-01-01 10:00:00'", "2, 'older', '2023-06-01 08:00:00'"});
+TEST_P(OrderEndToEndTest, DateTimeKeyUpdatesReadOnlyLaterRowsAndReplaceTheRowsOfKeysReadAgain) {
+  const std::string t = Table("dated", "id integer, title varchar(20), n integer, changed timestamp",
+                              {"1, 'pear', 5, '2024-01-01 10:00:00'",
+                               "2, 'apple', 3, '2023-06-01 08:00:00'",
+                               "3, 'fig', 8, '2024-01-01 10:00:00'"});
   ASSERT_EQ(command_->SetOrderUpdateOptions(0, VARIANT_TRUE, VARIANT_FALSE), S_OK);
-  ASSERT_EQ(command_->CreateOrderEx(T("Dated"), T("select id, title, changed from " + t),
-                                    T("title"), T("id"), VARIANT_TRUE, T("changed")),
-            S_OK)
-      << LastError();
-  // Key 1 changes after the highest change time; key 2 changes, but its
-  // time stays before it, so the update does not see it.
-  OnSource({"update " + t + " set title = 'renewed', changed = '2024-01-02 00:00:00' where id = 1",
-            "update " + t + " set title = 'unseen' where id = 2",
-            "insert into " + t + " values (3, 'new', '2024-01-01 10:00:01')"});
-  ASSERT_EQ(Run("UPDATE ORDER Dated"), "");
-  EXPECT_EQ(ColumnType("DATED", "TITLE"), TextType());
-  EXPECT_EQ(Column("DATED", "TITLE"),
-            (Entries{{"new", {3}}, {"older", {2}}, {"renewed", {1}}}));
+  for (const char* column : {"title", "n"}) {
+    ASSERT_EQ(command_->CreateOrderEx(T(column), T("select id, title, n, changed from " + t),
+                                      T(column), T("id"), VARIANT_TRUE, T("changed")),
+              S_OK)
+        << LastError();
+  }
+  // Key 1 changes after the highest change time and key 4 is new; key 3
+  // changes, but its time stays, so the update does not see it.
+  OnSource({"update " + t + " set title = 'zucchini', n = 50, changed = '2024-01-02 09:00:00' "
+                           "where id = 1",
+            "update " + t + " set title = 'kiwi', n = 0 where id = 3",
+            "insert into " + t + " values (4, 'apple', 1, '2024-01-01 10:00:01')"});
+  ASSERT_EQ(Run("UPDATE ORDER Title"), "");
+  ASSERT_EQ(Run("UPDATE ORDER N"), "");
   EXPECT_NE(TraceText().find("changed>'2024-01-01 10:00:00'"), std::string::npos);
+  // pear had key 1 only: it goes, and every rank after it moves.
+  EXPECT_EQ(ColumnType("TITLE", "TITLE"), TextType());
+  EXPECT_EQ(Column("TITLE", "TITLE"), (Entries{{"apple", {2, 4}}, {"fig", {3}}, {"zucchini", {1}}}));
+  EXPECT_EQ(RowsOf("TITLE"), (Rows{{1, 2}, {2, 0}, {3, 1}, {4, 0}}));
+  EXPECT_EQ(RowsOf("N"), (Rows{{1, 50}, {2, 3}, {3, 8}, {4, 1}}));
+  EXPECT_EQ(Header("N").sort_max, 4);
+
+  // Nothing later: the update succeeds and changes no byte.
+  const std::string sri = test::ReadFile(OrderFolder() + "N.sri");
+  const std::string srt = test::ReadFile(OrderFolder() + "N.srt");
+  ASSERT_EQ(Run("UPDATE ORDER N"), "");
+  EXPECT_EQ(test::ReadFile(OrderFolder() + "N.sri"), sri);
+  EXPECT_EQ(test::ReadFile(OrderFolder() + "N.srt"), srt);
+  EXPECT_TRUE(fs::is_empty(GroupFolder() + "WorkData"));
 }
 
 TEST_P(OrderEndToEndTest, DropOrderRemovesEveryFileAndBackgroundBuildsReport) {
@@ -185,14 +230,13 @@ TEST_P(OrderEndToEndTest, DropOrderRemovesEveryFileAndBackgroundBuildsReport) {
   ASSERT_EQ(command_->CreateOrderEx(T("Both"), T("select id, a, b from " + t), T("a,b"), T("id"),
                                     VARIANT_FALSE, nullptr),
             S_OK);
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
-  EXPECT_EQ(OrderFiles().size(), 4u);
-  ASSERT_EQ(Run("DROP ORDER both"), "");
-  EXPECT_TRUE(OrderFiles().empty());
-  EXPECT_FALSE(Run("DROP ORDER Both").empty());
-
   ASSERT_EQ(Run("CREATE ORDER Single ON TABLE " + t + " COLUMNS b KEY id"), "");
+  EXPECT_EQ(OrderFiles().size(), 6u);
+  ASSERT_EQ(Run("DROP ORDER both"), "");
+  EXPECT_EQ(OrderFiles(), (std::vector<std::string>{"SINGLE.sri", "SINGLE.srt"}));
+  EXPECT_FALSE(Run("DROP ORDER Both").empty());
   ASSERT_EQ(command_->DropOrder(T("Single")), S_OK) << LastError();
   EXPECT_TRUE(OrderFiles().empty());
 
@@ -201,7 +245,7 @@ TEST_P(OrderEndToEndTest, DropOrderRemovesEveryFileAndBackgroundBuildsReport) {
   ASSERT_EQ(command_->ExecuteEx(T("CREATE ORDER None ON TABLE " + empty + " COLUMNS a KEY id"),
                                 VARIANT_FALSE),
             S_OK);
-  WaitForJob();
+  test::WaitForJob(*command_);
   EXPECT_EQ(ErrorNumber(), 1);
   EXPECT_NE(ErrorMsg().find("No rows were selected for the order"), std::string::npos);
   EXPECT_TRUE(OrderFiles().empty());

@@ -1,6 +1,8 @@
 // Test-side reading of order files, written from their byte layout alone:
 // the header fields at the start of block 0 of NAME.sri, the rows of
-// NAME.srt and the entries of NAME_COLUMN.col. Little-endian throughout.
+// NAME.srt and the entries of NAME_COLUMN.col. Little-endian throughout. A
+// read past the end, or a length or count beyond the bytes left, throws
+// DecodeError: nothing after it would mean anything.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -17,8 +19,6 @@
 
 namespace qm::test {
 
-// A read past the end of the bytes, or a length or count larger than what
-// is left, stops the decoding: nothing after it would mean anything.
 class DecodeError : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
@@ -26,54 +26,51 @@ class DecodeError : public std::runtime_error {
 
 class LeReader {
  public:
-  // name: the file the bytes are from, for the failure text.
-  LeReader(std::string bytes, std::string name, std::size_t at = 0)
-      : bytes_(std::move(bytes)), name_(std::move(name)), at_(at) {}
+  // The bytes of the file at path, read from at.
+  explicit LeReader(const std::string& path, std::size_t at = 0)
+      : bytes_(ReadFile(path)), path_(path), at_(at) {}
 
   uint64_t Unsigned(std::size_t n) {
-    Require(n, "value");
+    Require(n);
     uint64_t v = 0;
     for (std::size_t i = n; i-- > 0;) v = (v << 8) | static_cast<unsigned char>(bytes_[at_ + i]);
     at_ += n;
     return v;
   }
   int32_t I32() { return static_cast<int32_t>(static_cast<uint32_t>(Unsigned(4))); }
+  // A count of items of item_size bytes that must all follow.
+  int32_t Count(std::size_t item_size) {
+    const int32_t n = I32();
+    if (n < 0) throw DecodeError(path_ + ": negative count " + std::to_string(n));
+    Require(item_size * static_cast<std::size_t>(n));
+    return n;
+  }
   std::string Narrow() {
     const std::size_t n = Unsigned(2);
-    Require(n, "narrow text");
-    std::string s = bytes_.substr(at_, n);
+    Require(n);
     at_ += n;
-    return s;
+    return bytes_.substr(at_ - n, n);
   }
   // As UTF-8.
   std::string Wide() {
     const std::size_t n = Unsigned(2);
-    Require(2 * n, "wide text");
     std::u16string s;
     for (std::size_t i = 0; i < n; ++i) s.push_back(static_cast<char16_t>(Unsigned(2)));
     return Utf16ToUtf8(s);
-  }
-  // count 32-bit items follow: refused unless they are all there.
-  void RequireItems(int32_t count, const char* what) {
-    if (count < 0) Fail(std::string("negative ") + what + " " + std::to_string(count));
-    Require(4 * static_cast<std::size_t>(count), what);
   }
   bool AtEnd() const { return at_ >= bytes_.size(); }
   std::size_t Size() const { return bytes_.size(); }
 
  private:
-  void Require(std::size_t n, const char* what) {
+  void Require(std::size_t n) const {
     if (n > bytes_.size() - at_) {
-      Fail(std::string(what) + " of " + std::to_string(n) + " bytes past the end");
+      throw DecodeError(path_ + ": " + std::to_string(n) + " bytes past the end at " +
+                        std::to_string(at_) + " of " + std::to_string(bytes_.size()));
     }
-  }
-  [[noreturn]] void Fail(const std::string& what) const {
-    throw DecodeError(name_ + ": " + what + " at " + std::to_string(at_) + " of " +
-                      std::to_string(bytes_.size()));
   }
 
   std::string bytes_;
-  std::string name_;
+  std::string path_;
   std::size_t at_;
 };
 
@@ -100,9 +97,8 @@ struct OrderHeader {
 
 // Block 0: used count (4 bytes), 2 bytes 0, then the fields.
 inline OrderHeader DecodeOrderHeader(const std::string& path) {
-  const std::string bytes = ReadFile(path);
-  EXPECT_EQ(bytes.size(), 4096u) << path;
-  LeReader r(bytes, path, 6);
+  LeReader r(path, 6);
+  EXPECT_EQ(r.Size(), 4096u) << path;
   OrderHeader h;
   h.version = r.I32();
   h.version_text = r.Narrow();
@@ -111,9 +107,7 @@ inline OrderHeader DecodeOrderHeader(const std::string& path) {
   h.table = r.Narrow();
   h.sql_as_table = r.I32();
   h.sql = r.Narrow();
-  const int32_t n = r.I32();
-  if (n < 0) throw DecodeError(path + ": negative column count");
-  for (int32_t i = 0; i < n; ++i) {
+  for (int32_t i = 0, n = r.Count(0); i < n; ++i) {
     HeaderColumn c;
     c.name = r.Narrow();
     c.type = r.I32();
@@ -129,9 +123,9 @@ inline OrderHeader DecodeOrderHeader(const std::string& path) {
 
 // The count, then count rows of width integers; the file holds nothing else.
 inline std::vector<std::vector<int32_t>> DecodeOrderRows(const std::string& path, int width) {
-  LeReader r(ReadFile(path), path);
-  const int32_t count = r.I32();
-  if (count < 0 || r.Size() != 4u + 4u * static_cast<std::size_t>(width) * count) {
+  LeReader r(path);
+  const int32_t count = r.Count(4 * static_cast<std::size_t>(width));
+  if (r.Size() != 4u + 4u * static_cast<std::size_t>(width) * count) {
     throw DecodeError(path + ": " + std::to_string(r.Size()) + " bytes do not hold " +
                       std::to_string(count) + " rows of " + std::to_string(width));
   }
@@ -156,7 +150,7 @@ inline std::ostream& operator<<(std::ostream& out, const ColumnEntry& e) {
 
 // Entries: the value in the encoding of type, the key count, the keys.
 inline std::vector<ColumnEntry> DecodeColumnFile(const std::string& path, int32_t type) {
-  LeReader r(ReadFile(path), path);
+  LeReader r(path);
   std::vector<ColumnEntry> entries;
   while (!r.AtEnd()) {
     ColumnEntry e;
@@ -171,20 +165,14 @@ inline std::vector<ColumnEntry> DecodeColumnFile(const std::string& path, int32_
         break;
       }
       case 3: {
-        const auto year = static_cast<int16_t>(r.Unsigned(2));
-        std::vector<uint64_t> f;
-        for (int i = 0; i < 5; ++i) f.push_back(r.Unsigned(2));
+        e.value = std::to_string(static_cast<int16_t>(r.Unsigned(2)));
+        for (const char* sep : {"-", "-", " ", ":", ":"}) e.value += sep + std::to_string(r.Unsigned(2));
         r.Unsigned(4);  // fraction
-        e.value = std::to_string(year) + "-" + std::to_string(f[0]) + "-" + std::to_string(f[1]) +
-                  " " + std::to_string(f[2]) + ":" + std::to_string(f[3]) + ":" +
-                  std::to_string(f[4]);
         break;
       }
       default: throw DecodeError(path + ": no value type " + std::to_string(type));
     }
-    const int32_t n = r.I32();
-    r.RequireItems(n, "keys");
-    for (int32_t i = 0; i < n; ++i) e.keys.push_back(r.I32());
+    for (int32_t i = 0, n = r.Count(4); i < n; ++i) e.keys.push_back(r.I32());
     entries.push_back(std::move(e));
   }
   return entries;

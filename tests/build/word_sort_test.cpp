@@ -1,7 +1,6 @@
-// The word sort against real data sources (SQLite through its ODBC driver, and
-// the PostgreSQL server of scripts/test through both of its drivers): the
-// entries of the sorted file, the findex type, the row errors, updates and
-// partial builds, document columns, and the files left behind.
+// The word sort against real data sources: the entries of the sorted file,
+// the findex type, the row errors, document columns, and the files left
+// behind.
 #include "build/word_sort.h"
 
 #include <gtest/gtest.h>
@@ -54,25 +53,11 @@ class WordSortTest : public test::SourceRowsTest {
     return entries;
   }
 
-  static std::string Text(const CValue& v) {
-    switch (v.GetType()) {
-      case VALUE_TYPE::AsciiString: return std::string(v.Narrow());
-      case VALUE_TYPE::UnicodeString: return Utf16ToUtf8(v.Wide());
-      case VALUE_TYPE::Integer: return std::to_string(v.GetInteger());
-      case VALUE_TYPE::Double: return std::to_string(v.GetDouble());
-      case VALUE_TYPE::DateTime: break;
-    }
-    const DateTimeValue& t = v.GetDateTime();
-    return std::to_string(t.year) + "-" + std::to_string(t.month) + "-" + std::to_string(t.day) +
-           " " + std::to_string(t.hour) + ":" + std::to_string(t.minute) + ":" +
-           std::to_string(t.second);
-  }
-
   std::vector<Entry> SortedEntries(CIndexHeader& d) {
     const CColumnSet set = CColumnSet::FromGeneralFlags(d.GeneralFlags);
     std::vector<Entry> out;
     for (const auto& e : Sort(d)) {
-      out.emplace_back(Text(e.value), e.row[0], set.s ? e.row[1] : 0,
+      out.emplace_back(test::WordText(e.value), e.row[0], set.s ? e.row[1] : 0,
                        set.p ? e.row[set.PositionColumn()] : 0);
     }
     return out;
@@ -99,64 +84,32 @@ INSTANTIATE_TEST_SUITE_P(Sources, WordSortTest,
                          ::testing::Values(Source::SQLite, Source::PostgresAnsi,
                                            Source::PostgresUnicode));
 
-TEST_P(WordSortTest, TextRowsGiveWordEntriesWithKeysWeightsAndPositions) {
-  const std::string t = Table("id INTEGER, title VARCHAR(200), body VARCHAR(200)");
-  Run("INSERT INTO " + t + " VALUES (2, 'one two. three', 'Two')");
-  Run("INSERT INTO " + t + " VALUES (1, 'two', NULL)");
-  Run("INSERT INTO " + t + " VALUES (3, NULL, NULL)");
-  // Scores, phrases, default separators. body comes first in the column map;
-  // title starts one position later, and its sentence end leaves a gap:
-  // "one two. three" takes 1, 2 and 4 counted from there.
-  CIndexHeader d = Findex(t, {{"title", {{"CONTENT_WEIGHT", "3"}}}, {"body", {{"content_weight", "0"}}}}, 7);
-  EXPECT_EQ(SortedEntries(d), (std::vector<Entry>{{"ONE", 2, 3, 3},
-                                                  {"THREE", 2, 3, 6},
-                                                  {"TWO", 1, 3, 2},
-                                                  {"TWO", 2, 1, 1},
-                                                  {"TWO", 2, 3, 4}}));
-  // Only the Unicode PostgreSQL driver describes VARCHAR as wide text.
-  EXPECT_EQ(d.FindexType, GetParam() == Source::PostgresUnicode ? 4 : 2);
-  EXPECT_EQ(d.KeyCount, 3);
-  EXPECT_EQ(d.SortMax, 3);
-  EXPECT_GT(d.BuildTime.year, 2000);
-  EXPECT_EQ(home_.Defs().GetProgress(), 90);
-  const std::string trace = home_.TraceText();
-  EXPECT_NE(trace.find("Executing SQL. SQL: select id,body,title from " + t), std::string::npos);
-  EXPECT_NE(trace.find("End Status. Row Count 3, Word Count: 5, Null Count: 3"), std::string::npos);
-  EXPECT_TRUE(home_.WorkFiles().empty());
-}
+// The rules below do not depend on the driver.
+class WordSortTestSqlite : public WordSortTest {};
+INSTANTIATE_TEST_SUITE_P(Sources, WordSortTestSqlite, ::testing::Values(Source::SQLite));
 
-TEST_P(WordSortTest, NumberAndDateColumnsMakeTypedFindexesAndMixedOnesText) {
-  const std::string t =
-      Table("id INTEGER, n INTEGER, r DOUBLE PRECISION, d TIMESTAMP, label VARCHAR(20)");
+TEST_P(WordSortTest, IndexedColumnsAloneDecideTheFindexType) {
+  const std::string t = Table("id INTEGER, n INTEGER, r DOUBLE PRECISION, d TIMESTAMP, label VARCHAR(20)");
   Run("INSERT INTO " + t + " VALUES (1, 10, 2.5, '2024-02-29 13:45:59', 'x')");
-  Run("INSERT INTO " + t + " VALUES (2, -5, -1.25, '1999-12-31 23:59:59', 'y')");
-  Run("INSERT INTO " + t + " VALUES (3, 3, NULL, '2024-02-29 13:45:58', NULL)");
+  Run("INSERT INTO " + t + " VALUES (2, -5, -1.25, '1999-12-31 23:59:59', NULL)");
   Run("INSERT INTO " + t + " VALUES (4, NULL, 10000000000, NULL, 'z')");
-
-  CIndexHeader ints = Findex(t, {{"n", {}}}, 4);
-  EXPECT_EQ(SortedEntries(ints), (std::vector<Entry>{{"-5", 2, 0, 0}, {"3", 3, 0, 0}, {"10", 1, 0, 0}}));
-  EXPECT_EQ(ints.FindexType, 1);
 
   // Integers widen to doubles; with phrases, the second column is position 1.
   CIndexHeader doubles = Findex(t, {{"n", {}}, {"r", {}}}, 6);
   EXPECT_EQ(SortedEntries(doubles),
             (std::vector<Entry>{{"-5.000000", 2, 0, 0}, {"-1.250000", 2, 0, 1},
-                                {"2.500000", 1, 0, 1}, {"3.000000", 3, 0, 0},
-                                {"10.000000", 1, 0, 0}, {"10000000000.000000", 4, 0, 1}}));
+                                {"2.500000", 1, 0, 1}, {"10.000000", 1, 0, 0},
+                                {"10000000000.000000", 4, 0, 1}}));
   EXPECT_EQ(doubles.FindexType, 6);
 
-  CIndexHeader dates = Findex(t, {{"d", {}}}, 4);
-  EXPECT_EQ(Values(dates), (std::vector<std::string>{"1999-12-31 23:59:59", "2024-2-29 13:45:58",
-                                                     "2024-2-29 13:45:59"}));
-  EXPECT_EQ(dates.FindexType, 3);
-
-  // Only indexed columns decide: the text column label is selected, not indexed.
+  // The text column label is selected, not indexed.
   CIndexHeader selected = Findex(t, {{"d", {}}}, 4);
   selected.SqlUsedAsTable = 1;
   selected.SqlSelect = "select label, d, id from " + t;
-  EXPECT_EQ(Values(selected).size(), 3u);
+  EXPECT_EQ(Values(selected), (std::vector<std::string>{"1999-12-31 23:59:59", "2024-2-29 13:45:59"}));
   EXPECT_EQ(selected.FindexType, 3);
 
+  // Dates with numbers make a text findex of their words.
   CIndexHeader mixed = Findex(t, {{"d", {}}, {"n", {}}}, 4);
   const std::vector<std::string> words = Values(mixed);
   EXPECT_EQ(mixed.FindexType, 2);
@@ -165,8 +118,7 @@ TEST_P(WordSortTest, NumberAndDateColumnsMakeTypedFindexesAndMixedOnesText) {
   }
 }
 
-TEST_P(WordSortTest, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {
-  if (GetParam() != Source::SQLite) GTEST_SKIP() << "the row rules do not depend on the driver";
+TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {
   const std::string suffix = " (Module:PiSort,Method:WriteFindexRows)";
   // The binary column gives every row a work-file copy: they must go too.
   const std::string nulls = Table("id INTEGER, title TEXT, doc BLOB");
@@ -175,9 +127,6 @@ TEST_P(WordSortTest, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {
   EXPECT_EQ(Failure(Findex(nulls, with_document, 6)).first,
             "Unique key column contains NULL values" + suffix);
 
-  const std::string text_keys = Table("id TEXT, title TEXT");
-  Run("INSERT INTO " + text_keys + " VALUES ('7', 'x'), ('abc', 'y')");
-  EXPECT_EQ(Failure(Findex(text_keys, {{"title", {}}}, 6)).first, "Unique key is not numeric" + suffix);
   const std::string real_keys = Table("id REAL, title TEXT");
   Run("INSERT INTO " + real_keys + " VALUES (7.0, 'x'), (2.5, 'y')");
   EXPECT_EQ(Failure(Findex(real_keys, {{"title", {}}}, 6)).first, "Unique key is not numeric" + suffix);
@@ -204,48 +153,7 @@ TEST_P(WordSortTest, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {
   EXPECT_EQ(all_null.KeyCount, 1);
 }
 
-TEST_P(WordSortTest, UpdatesAndPartialBuildsReadOnlyTheirKeys) {
-  if (GetParam() != Source::SQLite) GTEST_SKIP() << "the statements are the same for every driver";
-  const std::string t = Table("id INTEGER, title TEXT, d TIMESTAMP");
-  for (int key : {1, 2, 500, 501, 199999, 200000}) {
-    Run("INSERT INTO " + t + " VALUES (" + std::to_string(key) + ", 'w" + std::to_string(key) +
-        "', NULL)");
-  }
-  auto keys = [&](CIndexHeader& d) {
-    std::vector<int32_t> out;
-    for (const auto& e : SortedEntries(d)) out.push_back(std::get<1>(e));
-    std::sort(out.begin(), out.end());
-    return out;
-  };
-  CIndexHeader update = Findex(t, {{"title", {}}}, 6);
-  update.SortMax = 500;
-  EXPECT_EQ(keys(update), (std::vector<int32_t>{501, 199999, 200000}));
-  EXPECT_EQ(update.SortMax, 200000);
-  EXPECT_NE(home_.TraceText().find("SQL: select id,title from " + t + " where id>500"),
-            std::string::npos);
-
-  CIndexHeader slice = Findex(t, {{"title", {}}}, 6);
-  slice.IndexMaxSize = 2;
-  slice.IndexStartValue = 1;
-  EXPECT_EQ(keys(slice), (std::vector<int32_t>{1, 2, 500, 501, 199999}));
-  EXPECT_EQ(slice.SortMax, 199999);
-
-  // The date/time update key: the highest value read is kept, and an update
-  // reads only rows past it.
-  Run("INSERT INTO " + t + " VALUES (7, 'old', '2024-01-01 10:00:00')");
-  Run("INSERT INTO " + t + " VALUES (8, 'new', '2024-01-03 08:00:00')");
-  CIndexHeader dated = Findex(t, {{"title", {}}}, 6);
-  dated.UpdateFlags = 1;
-  dated.DateTimeKeyColumn = "d";
-  EXPECT_EQ(keys(dated).size(), 8u);
-  EXPECT_EQ(dated.MaxDateTimeKey, (DateTimeValue{2024, 1, 3, 8, 0, 0, 0}));
-  dated.MaxDateTimeKey = {2024, 1, 2, 0, 0, 0, 0};
-  EXPECT_EQ(Values(dated), std::vector<std::string>{"NEW"});
-  EXPECT_NE(home_.TraceText().find(" where d>'2024-01-02 00:00:00'"), std::string::npos);
-}
-
-TEST_P(WordSortTest, DocumentColumnsIndexTheirTextAndFilesOutsideTheBaseAreRefused) {
-  if (GetParam() != Source::SQLite) GTEST_SKIP() << "documents do not depend on the driver";
+TEST_P(WordSortTestSqlite, DocumentColumnsIndexTheirTextAndFilesOutsideTheBaseAreRefused) {
   test::WriteFile(home_.Data() + "Converters/Converters.txt", "ALL=[PLAIN_TEXT]\n");
   const std::string docs = home_.Data() + "docs/";
   fs::create_directories(docs + "sub");
@@ -277,8 +185,7 @@ TEST_P(WordSortTest, DocumentColumnsIndexTheirTextAndFilesOutsideTheBaseAreRefus
   EXPECT_TRUE(home_.WorkFiles().empty());
 }
 
-TEST_P(WordSortTest, DefaultOptionsTakeTheLanguageDataOfTheDataRoot) {
-  if (GetParam() != Source::SQLite) GTEST_SKIP() << "the language does not depend on the driver";
+TEST_P(WordSortTestSqlite, DefaultOptionsTakeTheLanguageDataOfTheDataRoot) {
   fs::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
            fs::copy_options::recursive);
   const std::string t = Table("id INTEGER, body TEXT");

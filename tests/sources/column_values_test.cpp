@@ -20,31 +20,18 @@ const std::string kCannotConvert =
     "Could not convert column value into appropriate type "
     "(Module:ShareDatabase,Method:GetColumnValueFromCache)\r\n";
 
-CValue Narrow(std::string_view s) {
+// A value set by one of CValue's setters.
+template <class T>
+CValue Make(void (CValue::*set)(T), T x) {
   CValue v;
-  v.SetText(s);
+  (v.*set)(x);
   return v;
 }
-CValue Wide(std::u16string_view s) {
-  CValue v;
-  v.SetTextW(s);
-  return v;
-}
-CValue Int(int32_t i) {
-  CValue v;
-  v.SetInteger(i);
-  return v;
-}
-CValue Dbl(double d) {
-  CValue v;
-  v.SetDouble(d);
-  return v;
-}
-CValue Date(DateTimeValue d) {
-  CValue v;
-  v.SetDateTime(d);
-  return v;
-}
+CValue Narrow(std::string_view s) { return Make(&CValue::SetText, s); }
+CValue Wide(std::u16string_view s) { return Make(&CValue::SetTextW, s); }
+CValue Int(int32_t i) { return Make(&CValue::SetInteger, i); }
+CValue Dbl(double d) { return Make(&CValue::SetDouble, d); }
+CValue Date(DateTimeValue d) { return Make<const DateTimeValue&>(&CValue::SetDateTime, d); }
 
 CValue Convert(const CValue& from, VALUE_TYPE to) {
   CValue out;

@@ -20,6 +20,7 @@ namespace qm {
 namespace {
 
 namespace fs = std::filesystem;
+using test::FailureText;
 using test::ReadFile;
 
 // The test server helper, started once for the whole test program.
@@ -61,16 +62,6 @@ const ServerProcess& Server() {
   return server;
 }
 
-template <class F>
-std::string FailureText(F&& f) {
-  try {
-    f();
-  } catch (CExceptionBase& e) {
-    return e.GetFullTextUtf8(kLevelWritten);
-  }
-  return "no failure";
-}
-
 constexpr const char* kTimeoutText = "Connection Timeout (Module:Connection,Method:OpenConnection)\r\n";
 
 class ConnectionTest : public ::testing::Test {
@@ -102,7 +93,7 @@ class ConnectionTest : public ::testing::Test {
   test::ScratchDir dir_{"downloads"};
 };
 
-TEST_F(ConnectionTest, PagesEmptyAndLargeResources) {
+TEST_F(ConnectionTest, PagesEmptyAndLargeResourcesWithTheUserAgent) {
   Connection c;
   EXPECT_EQ(Fetch(c, "/page.html"),
             "<html><head><title>River Guide</title></head>"
@@ -140,10 +131,7 @@ TEST_F(ConnectionTest, PagesEmptyAndLargeResources) {
   c.DownloadResource(file);
   EXPECT_NE(FailureText([&] { c.DownloadResource(file); }).find("Method:DownloadResource"),
             std::string::npos);
-}
 
-TEST_F(ConnectionTest, SendsTheUserAgent) {
-  Connection c;
   const std::string head = Fetch(c, "/echo");
   EXPECT_NE(head.find("\r\nUser-Agent: Quillmere Search Search Engine Software ("), std::string::npos)
       << head;

@@ -5,10 +5,22 @@
 #include <filesystem>
 #include <string>
 
+#include "shared/exception.h"
 #include "shared/global_defs.h"
 #include "support/test_support.h"
 
 namespace qm::test {
+
+// The text a host is shown of what f raised, or "no failure".
+template <class F>
+std::string FailureText(F&& f) {
+  try {
+    f();
+  } catch (CExceptionBase& e) {
+    return e.GetFullTextUtf8(kLevelWritten);
+  }
+  return "no failure";
+}
 
 class ConverterHome {
  public:

@@ -20,18 +20,9 @@ namespace {
 
 namespace fs = std::filesystem;
 using test::ConverterHome;
+using test::FailureText;
 using test::ReadFile;
 using test::WriteFile;
-
-template <class F>
-std::string FailureText(F&& f) {
-  try {
-    f();
-  } catch (CExceptionBase& e) {
-    return e.GetFullTextUtf8(kLevelWritten);
-  }
-  return "no failure";
-}
 
 std::string Quoted(const std::string& path) { return "\"" + path + "\""; }
 

@@ -22,6 +22,11 @@ namespace fs = std::filesystem;
 
 enum class Source { SQLite, PostgresAnsi, PostgresUnicode };
 
+std::string SourceName(const ::testing::TestParamInfo<Source>& info) {
+  const char* names[] = {"SQLite", "PostgresAnsi", "PostgresUnicode"};
+  return names[static_cast<int>(info.param)];
+}
+
 const char* EnvName(Source s) {
   return s == Source::PostgresAnsi ? "QM_TEST_PG_ANSI" : "QM_TEST_PG_UNICODE";
 }
@@ -314,16 +319,7 @@ TEST_P(SourceTest, ResultsOfMoreThan99ColumnsAreRefused) {
 INSTANTIATE_TEST_SUITE_P(Drivers, SourceTest,
                          ::testing::Values(Source::SQLite, Source::PostgresAnsi,
                                            Source::PostgresUnicode),
-                         [](const auto& info) {
-                           switch (info.param) {
-                             case Source::SQLite:
-                               return std::string("SQLite");
-                             case Source::PostgresAnsi:
-                               return std::string("PostgresAnsi");
-                             default:
-                               return std::string("PostgresUnicode");
-                           }
-                         });
+                         SourceName);
 
 TEST_F(DatabaseTest, IntegerColumnsNeverWrapNorTurnGarbageIntoNull) {
   UseSqlite();

@@ -29,13 +29,13 @@ class ServerProcess {
   ServerProcess() {
     int out[2];
     if (pipe(out) != 0) return;
+    const std::string path = test::HelperPath("http_test_server");  // no allocation after fork
     pid_ = fork();
     if (pid_ == 0) {
       prctl(PR_SET_PDEATHSIG, SIGKILL);  // never outlives a crashed test
       dup2(out[1], 1);
       close(out[0]);
       close(out[1]);
-      const std::string path = test::HelperPath("http_test_server");
       execl(path.c_str(), path.c_str(), static_cast<char*>(nullptr));
       _exit(127);
     }

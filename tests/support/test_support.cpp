@@ -90,6 +90,11 @@ int RunProgram(const std::vector<std::string>& argv, std::string* out) {
   // Close-on-exec: a child started at the same time by another thread must not
   // keep this pipe open, or this read would wait for that child to end.
   if (out != nullptr && pipe2(pipefd, O_CLOEXEC) != 0) return -1;
+  // Built before the fork: tests start children from several threads, and a
+  // child that allocates may find the allocator locked by a thread it lacks.
+  std::vector<char*> args;
+  for (const auto& a : argv) args.push_back(const_cast<char*>(a.c_str()));
+  args.push_back(nullptr);
   const pid_t pid = fork();
   if (pid == 0) {
     if (out != nullptr) {
@@ -97,9 +102,6 @@ int RunProgram(const std::vector<std::string>& argv, std::string* out) {
       close(pipefd[0]);
       close(pipefd[1]);
     }
-    std::vector<char*> args;
-    for (const auto& a : argv) args.push_back(const_cast<char*>(a.c_str()));
-    args.push_back(nullptr);
     execv(args[0], args.data());
     _exit(127);
   }

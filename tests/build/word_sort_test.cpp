@@ -82,11 +82,13 @@ class WordSortTest : public test::SourceRowsTest {
 
 INSTANTIATE_TEST_SUITE_P(Sources, WordSortTest,
                          ::testing::Values(Source::SQLite, Source::PostgresAnsi,
-                                           Source::PostgresUnicode));
+                                           Source::PostgresUnicode),
+                         test::SourceName);
 
 // The rules below do not depend on the driver.
 class WordSortTestSqlite : public WordSortTest {};
-INSTANTIATE_TEST_SUITE_P(Sources, WordSortTestSqlite, ::testing::Values(Source::SQLite));
+INSTANTIATE_TEST_SUITE_P(Sources, WordSortTestSqlite, ::testing::Values(Source::SQLite),
+                         test::SourceName);
 
 TEST_P(WordSortTest, IndexedColumnsAloneDecideTheFindexType) {
   const std::string t = Table("id INTEGER, n INTEGER, r DOUBLE PRECISION, d TIMESTAMP, label VARCHAR(20)");

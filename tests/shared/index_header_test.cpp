@@ -13,7 +13,6 @@
 #include "shared/exception_family.h"
 #include "shared/index_header.h"
 #include "shared/order_info.h"
-#include "shared/trace.h"
 
 namespace qm {
 namespace {
@@ -207,22 +206,6 @@ TEST_F(HeaderFile, OverLongDefinitionsAreRefusedBeforeWriting) {
   EXPECT_FALSE(o.FitsHeaderBlock());
   EXPECT_THROW(o.WriteInfo(file), CHighStructuresException);
   EXPECT_EQ(file.BlockCount(), 0);
-}
-
-TEST_F(HeaderFile, TraceLevelTwoLines) {
-  test::ConfiguredHome home;
-  TraceLevel2 = true;
-  Write(FullHeader(), "l.sdx");
-  Read<CIndexHeader>("l.sdx");
-  Write(FullOrder(), "l.sri");
-  Read<COrderInfo>("l.sri");
-  TraceLevel2 = false;
-  const std::pair<const char*, const char*> lines[] = {
-      {"FILIB", "(SHARELIB)CIndexHeader.WriteInfo - Writing index info"},
-      {"GILIB", "(SHARELIB)CIndexHeader.ReadInfo - Index info read"},
-      {"PILIB", "(SHARELIB)COrderInfo.WriteInfo - Writing order info"},
-      {"PILIB", "(SHARELIB)COrderInfo.ReadInfo - Order info read"}};
-  for (const auto& [module, line] : lines) EXPECT_TRUE(test::Has(test::TraceOf(home, module), line)) << line;
 }
 
 // Every way a header block can be damaged ends in a HighStructures error (the

@@ -215,14 +215,14 @@ TEST_F(HeaderFile, TruncatedOrScrambledHeaderBlocksAreRefused) {
   Write(FullHeader(), "h");
   Write(FullOrder(), "o");
   const std::string header = test::ReadFile(Path("h")), order = test::ReadFile(Path("o"));
-  for (std::size_t cut = 0; cut < 4096; cut += 97) {
+  for (std::size_t cut = 0; cut < 4096; cut += 293) {
     test::WriteFile(Path("t"), header.substr(0, cut));
     EXPECT_THROW(Read<CIndexHeader>("t"), CHighStructuresException) << cut;
   }
   // A few bytes changed within the fields behind the version, sometimes the
   // used count too; or noise behind a valid version.
   std::mt19937 random(99);
-  for (int round = 0; round < 800; ++round) {
+  for (int round = 0; round < 400; ++round) {
     const bool index = round % 2 == 0;
     std::string bytes = index ? header : order;
     if (round % 4 < 2) {
@@ -242,34 +242,6 @@ TEST_F(HeaderFile, TruncatedOrScrambledHeaderBlocksAreRefused) {
     } catch (const CHighStructuresException&) {
     }
   }
-}
-
-TEST(OrderSelect, TableOrSqlWithTheUpdateRestriction) {
-  COrderInfo o;
-  o.TableName = "books";
-  o.KeyColumn = "ID";
-  o.Columns = {{"TITLE", {}}, {"PRICE", {}}};
-  EXPECT_EQ(o.GetSelectDataSQL(false), "select ID,TITLE,PRICE from books");
-  o.SortMax = 500;
-  EXPECT_EQ(o.GetSelectDataSQL(false), "select ID,TITLE,PRICE from books where ID>500");
-  o.SqlUsedAsTable = 1;
-  o.SqlSelect = "select ID, TITLE from books";
-  EXPECT_EQ(o.GetSelectDataSQL(true),
-            "select * from (select ID, TITLE from books) as temp_table where ID>500");
-
-  o.SqlUsedAsTable = 0;
-  o.UpdateFlags = 1;
-  o.DateTimeKeyColumn = "CHANGED";
-  o.MaxDateTimeKey = {2024, 3, 9, 14, 5, 7, 5};
-  EXPECT_EQ(o.GetSelectDataSQL(false),
-            "select ID,TITLE,PRICE from books where CHANGED>'2024-03-09 14:05:07'");
-  EXPECT_EQ(o.GetSelectDataSQL(true),
-            "select ID,TITLE,PRICE from books where CHANGED>#2024-03-09 14:05:07#");
-  o.UpdateFlags = 3;
-  EXPECT_EQ(o.GetSelectDataSQL(false),
-            "select ID,TITLE,PRICE from books where CHANGED>'2024-03-09 14:05:07.000000005'");
-  o.SortMax = 0;
-  EXPECT_EQ(o.GetSelectDataSQL(false), "select ID,TITLE,PRICE from books");
 }
 
 }  // namespace

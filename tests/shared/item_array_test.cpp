@@ -132,12 +132,6 @@ TEST(ItemArray, MergeWidenAndFillGaps) {
   EXPECT_EQ(AllRows(left.Merge(right)), (Rows{{0, 5, F, 6, 9}, {1, 7, 8, F, F}}));
   EXPECT_EQ(AllRows(left.Widen(CColumnSet{1, 0, 0, 1})), (Rows{{1, F, 7, 8, F}}));
 
-  CItems big(CColumnSet{}), small(CColumnSet{});
-  for (int32_t i = 0; i < 100; ++i) big.InsertItem(std::vector<int32_t>{2 * i});
-  for (int32_t i = 0; i < 35; ++i) small.InsertItem(std::vector<int32_t>{2 * i + 1});
-  const CItems all = big.Merge(small);
-  const Rows merged_rows = AllRows(all);
-  EXPECT_TRUE(std::is_sorted(merged_rows.begin(), merged_rows.end()));
 
   CItems gaps = Array(CColumnSet{0, 0, 1, 0}, {{1, 0}, {0, 5}, {3, 0}});
   gaps.FillGaps();

@@ -47,32 +47,6 @@ TEST(TraceFiles, OneFilePerModuleAndDayWithMessagesCutAt1023Bytes) {
   EXPECT_TRUE(std::regex_match(test::TraceOf(home, "PILIB"), translating));
 }
 
-class TraceRollOver : public ::testing::Test {
- protected:
-  void TearDown() override { SetTraceFileLimitForTesting(100'000'000); }
-  test::ConfiguredHome home_;
-};
-
-TEST_F(TraceRollOver, AFullDayFileContinuesInTheFirstNumberedFileWithRoom) {
-  SetTraceFileLimitForTesting(100);
-  const std::string date = TraceDate(Today());
-  const std::string base = home_.Home() + "Log/trace_ROLL_" + date;
-  test::WriteFile(base + ".log", std::string(100, '.'));  // at the limit: still used
-  Trace(true, "ROLL.A", "one");
-  test::WriteFile(base + "_1.log", std::string(101, '.'));
-  test::WriteFile(base + "_2.log", std::string(10, '.'));
-  Trace(true, "ROLL.A", "two");  // base.log is now above the limit, _1 too
-  Trace(true, "ROLL.A", "three");
-  if (TraceDate(Today()) != date) GTEST_SKIP() << "the day changed during the test";
-
-  EXPECT_NE(test::ReadFile(base + ".log").find(" A - one\r\n"), std::string::npos);
-  EXPECT_EQ(test::ReadFile(base + "_1.log"), std::string(101, '.'));
-  const std::string second = test::ReadFile(base + "_2.log");
-  EXPECT_NE(second.find(" A - two\r\n"), std::string::npos);
-  EXPECT_NE(second.find(" A - three\r\n"), std::string::npos);
-  EXPECT_FALSE(fs::exists(base + "_3.log"));
-}
-
 TEST(TraceFailures, NothingIsWrittenOrThrownWithoutAUsableLogFolder) {
   {
     test::ConfiguredHome home;

@@ -102,10 +102,6 @@ TEST_F(EngineCommandsTest, EngineErrorsGoToStandardErrorAndExitOne) {
             "quillmere exec: Command not recognised (Module:PiStartPoint,Method:ExecuteW)\n");
 
 
-  r = Host({"info", "findex", "Books"});
-  EXPECT_EQ(r.status, 1);
-  EXPECT_EQ(r.out, "");
-  EXPECT_EQ(r.err.rfind("quillmere info: ", 0), 0u) << r.err;
 
   // A group whose folder is missing is the engine's error, at the first use.
   r = Host({"--group", "Nowhere", "exec", "SET GROUP Nowhere"});

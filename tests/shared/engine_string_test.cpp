@@ -20,7 +20,7 @@ using Texts = std::vector<std::string>;
 
 Texts General(const std::string& method) { return {"General Error (Module:Value,Method:" + method + ")"}; }
 
-TEST(EngineString, AppendsGrowAndReserveKeepsTheTextOnlyWhileItFits) {
+TEST(EngineString, AppendsAndCopiesGrow) {
   CStr s("abc");
   s.SCat("de");
   s.SCat("f", false);
@@ -32,13 +32,6 @@ TEST(EngineString, AppendsGrowAndReserveKeepsTheTextOnlyWhileItFits) {
   CWStr w(u"ab");  // full as soon as the length + 1 reaches the capacity
   w.AddChar(u'c');
   EXPECT_EQ(w.Str(), u"abc");
-  // Reserve keeps the text only while capacity >= n + 5.
-  CStr hello("hello");  // capacity 6
-  hello.Reserve(1);
-  EXPECT_EQ(hello.Str(), "hello");
-  hello.Reserve(2);
-  EXPECT_EQ(hello.Str(), "");
-  EXPECT_EQ(hello.Capacity(), 2u);
 }
 
 TEST(EngineString, BoundsAndRangeCopies) {

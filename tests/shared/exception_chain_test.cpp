@@ -86,9 +86,6 @@ TEST(ExceptionForms, GeneralAndTextErrors) {
                                         std::string("/data/a b.sdx"));
   EXPECT_EQ(EntryTexts(t), Texts{"Error deleting file: /data/a b.sdx (Module:STDFUN,Method:DropFile)"});
   EXPECT_EQ(t.GetEntries()[0].level, 100);
-  // The whole text is cut at 2,047 units.
-  const auto longer = CPiCmdException::Text("%s", "M", nullptr, std::string(3000, 'x'));
-  EXPECT_EQ(longer.GetEntries()[0].text.size(), 2047u);
 }
 
 class NumberedErrors : public ::testing::Test {
@@ -111,9 +108,6 @@ TEST_F(NumberedErrors, TakeTextAndLevelFromTheTableOrTheDefaultAtLevel200) {
   EXPECT_EQ(e.GetEntries()[0].level, 50);
   EXPECT_EQ(e.GetEntries()[0].number, 13);
   EXPECT_EQ(e.GetErrorNumber(), 13);
-  // Without a method the placeholder stays.
-  EXPECT_EQ(EntryTexts(CPiCmdException::Numbered(13, nullptr, nullptr)),
-            Texts{"Statement error in %METHOD of PiCmd: %s %MODULE"});
 
   const auto missing = CGiTreeRowsetException::Numbered(59, "SetOrder", nullptr);
   EXPECT_EQ(missing.GetEntries()[0].level, 200);

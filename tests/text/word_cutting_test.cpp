@@ -11,7 +11,6 @@
 #include "shared/file_test_util.h"
 #include "text/blank_trim.h"
 #include "text/next_word.h"
-#include "text/remove_blocks.h"
 #include "text/separators.h"
 #include "text/split.h"
 
@@ -73,9 +72,6 @@ std::string TakeAll(std::u16string_view text, const CSeparatorSet& set = CSepara
 TEST(NextWord, SentenceEndNeedsAMarkThenSeparatorsUpToABlank) {
   EXPECT_EQ(TakeAll(u"END. NEXT "), "END/2 NEXT/3 /1");
   EXPECT_EQ(TakeAll(u"AB? C AB; C AB:\tC AB! C "), "AB/2 C/3 AB/2 C/3 AB/2 C/3 AB/3 C/3 /1");
-  EXPECT_EQ(TakeAll(u"END.)\nNEXT END..NEXT "), "END/2 NEXT/3 END/3 NEXT/3 /1");
-  // A one-letter word before a full stop is an initial.
-  EXPECT_EQ(TakeAll(u"J. SMITH "), "J/3 SMITH/3 /1");
   // The blank must itself be a separator.
   EXPECT_EQ(TakeAll(u"END. NEXT", CSeparatorSet(u".")), "END/3  NEXT/0 /1");
 }
@@ -132,21 +128,6 @@ TEST(SplitW, MoreThanElevenPiecesIsAnError) {
   EXPECT_EQ(test::RaisedText<CStringFuncUException>([&] { s.SplitW(u"A*B*C*D*E*F*G*H*I*J*K*L"); }),
             "Too many words (Module:StringFuncU,Method:CSplit::SplitW)");
   EXPECT_TRUE(s.Pieces().empty());
-}
-
-std::u16string Removed(std::u16string text, std::u16string_view open, std::u16string_view close) {
-  RemoveBlocks(text, open, close);
-  return text;
-}
-
-TEST(RemoveBlocks, EveryStretchGoesAndAnUnclosedOneTakesTheRest) {
-  EXPECT_EQ(Removed(u"a<b>c<i>d</i>e", u"<", u">"), u"acde");
-  EXPECT_EQ(Removed(u"a>b<c>d", u"<", u">"), u"a>bd");
-  EXPECT_EQ(Removed(u"A<SCRIPT x>1<2</SCRIPT>B<SCRIPT>C</SCRIPT>", u"<SCRIPT", u"</SCRIPT>"), u"AB");
-  EXPECT_EQ(Removed(u"keep<lost forever", u"<", u">"), u"keep");
-  std::string narrow = "\xC3\xA9t\xC3\xA9<p>\xC3\xA0<";
-  RemoveBlocks(narrow, "<", ">");
-  EXPECT_EQ(narrow, "\xC3\xA9t\xC3\xA9\xC3\xA0");
 }
 
 TEST(BlankTrim, FourBlanksOnlyAndAtMost1999Characters) {

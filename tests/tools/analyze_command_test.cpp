@@ -96,10 +96,6 @@ TEST(AnalyzeCommand, LanguageFailuresEndWithTheEngineMessage) {
   InitialisedData data;
   std::string out;
   std::string err;
-  EXPECT_EQ(Analyze("x", {"--language", "12", "--stemming"}, out, data.Path(), &err), 1);
-  EXPECT_EQ(err,
-            "quillmere analyze: Stemming is only supported for specific languages, not for other "
-            "languages (Module:Language,Method:InitializeStemming)\n");
   std::filesystem::remove(data.Path() + "Language/English/stop.txt");
   EXPECT_EQ(Analyze("x", {"--stopwords"}, out, data.Path(), &err), 1);
   EXPECT_NE(err.find("Error opening file: " + data.Path() +

@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -48,11 +47,8 @@ TEST(WordPipeline, WordsGetTheFormsOfTheLanguageObjectForEveryStepSet) {
     int32_t flags;
   };
   const std::vector<Case> cases = {
-      {lngEnglish, CLanguage::kUseStopWords}, {lngEnglish, CLanguage::kUseStemming},
-      {lngEnglish, CLanguage::kUsePhonetic},  {lngEnglish, CLanguage::kRemoveAccents | 16},
-      {lngEnglish, 31},                       {lngGerman, CLanguage::kUseCharacterTranslation},
-      {lngGerman, 31},                        {lngDutch, CLanguage::kUsePhonetic | 4},
-      {lngRussian, 17},                       {lngOther, CLanguage::kUseStopWords | 8},
+      {lngEnglish, CLanguage::kUseStemming}, {lngEnglish, 31}, {lngGerman, 31},
+      {lngDutch, CLanguage::kUsePhonetic | 4}, {lngRussian, 17}, {lngOther, CLanguage::kUseStopWords | 8},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(std::to_string(c.language) + "/" + std::to_string(c.flags));
@@ -113,18 +109,12 @@ TEST(WordPipeline, LanguageDataComesFromTheSettingsAndOnlyForLanguageSteps) {
   EXPECT_EQ(configured.Language()->GetLanguageFolder(), language);
   EXPECT_EQ(Written(configured, "the rivers"), "1:THE");
 
-  // A folder where a file should be cannot be read.
-  std::filesystem::create_directories(language + "Dutch/info.txt");
-  std::string text = FailureText([&] { CWordPipeline p(defs, Options(lngDutch, 16)); });
-  EXPECT_TRUE(Contains(text, "Error reading from file (Module:WinFile,Method:ReadFromFile)")) << text;
-  EXPECT_TRUE(Contains(text, "(Module:Language,Method:LoadLanguage)")) << text;
-
   // No step: words as cut, with no data path and whatever language number.
   unsetenv("MORVIL_PATH");
   CWordPipeline plain(defs, Options(99, 0));
   EXPECT_EQ(plain.Language(), nullptr);
   EXPECT_EQ(Written(plain, "the \xC3\xA9lan"), "1:THE 2:\xC3\x89LAN");
-  text = FailureText([&] { CWordPipeline p(defs, Options(lngEnglish, CLanguage::kUseStopWords)); });
+  const std::string text = FailureText([&] { CWordPipeline p(defs, Options(lngEnglish, CLanguage::kUseStopWords)); });
   EXPECT_TRUE(Contains(text, "Data path is not set (Module:STDFUN,Method:GetFullDataPath)")) << text;
   EXPECT_TRUE(Contains(text, "(Module:Language,Method:CLanguage)")) << text;
 }

@@ -384,5 +384,44 @@ TEST(DamagedBlocks, RandomContentsGiveAnswersOrBlockErrors) {
   }
 }
 
+TEST_F(BFileTest, BlocksRoundTripWithTheirUsedCountAndLinkWords) {
+  BFile file;
+  file.OpenFile(Path("tree"), BFile::kCreate, 64);
+  CBlock block(64);
+  for (int i = 0; i < 3; ++i) {
+    block.Reset();
+    block.Data()[6] = static_cast<uint8_t>('a' + i);
+    block.SetUsed(300 + i);
+    file.AddBlock(block);
+  }
+  file.SetLinkWord1(0, 1);
+  file.SetLinkWord2(2, 0xBEEF);
+  file.SeekToBlock(1);  // rewriting block 1 keeps the others
+  block.Data()[6] = 'B';
+  block.SetUsed(4096);
+  file.WriteBlock(block);
+  EXPECT_EQ(file.BlockCount(), 3);
+  const std::string bytes = test::ReadFile(Path("tree"));
+  EXPECT_EQ(bytes.substr(0, 7), Word(300) + Word(1) + Word(0) + "a");
+  EXPECT_EQ(bytes.substr(4096, 7), Word(4096) + Word(0) + Word(0) + "B");
+  EXPECT_EQ(bytes.substr(8192, 7), Word(302) + Word(0) + Word(0xBEEF) + "c");
+
+  file.OpenFile(Path("tree"), BFile::kReadOnly, 64);
+  file.SeekToBlock(2);
+  file.ReadBlock(block);
+  EXPECT_EQ(block.GetUsed(), 302);
+  EXPECT_EQ(block.GetLinkWord2(), 0xBEEF);
+  EXPECT_EQ(block.GetCursor(), 6);
+  file.SeekToBlock(0);
+  file.ReadBlock(block);
+  EXPECT_EQ(block.GetLinkWord1(), 1);
+  file.ReadBlock(block);  // on from the current position
+  EXPECT_EQ(block.GetUsed(), 4096);
+  file.ReadBlock(block);
+  EXPECT_EQ(RaisedText<CBFileException>([&] { file.ReadBlock(block); }),
+            "Error reading block 3 of " + Path("tree") +
+                ": 0 of 4096 bytes read (Module:BFile,Method:ReadBlock)");
+}
+
 }  // namespace
 }  // namespace qm

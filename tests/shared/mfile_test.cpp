@@ -180,5 +180,104 @@ TEST_F(MFileTest, ScrambledKeyValueLines) {
                        {"last", "without end"}}));
 }
 
+TEST_F(MFileTest, ReadsWritesSeeksAndTakeOverKeepTheLogicalPosition) {
+  test::WriteFile(Path("p"), "ABCDEFGHIJ");
+  MFile f;
+  f.OpenFile(Path("p"), MFile::kOpenOrCreate);
+  char c[3];
+  ASSERT_EQ(f.mread(c, 3), 3u);
+  f.MCommit();  // bytes only read are never written back
+  EXPECT_EQ(test::ReadFile(Path("p")), "ABCDEFGHIJ");
+  f.mwrite("xy", 2);  // lands behind what was read, not behind the read-ahead
+  f.MCommit();
+  f.mread(c, 1);
+  EXPECT_EQ(c[0], 'F');
+  f.Seek(8);  // the read buffer of the old position is dropped
+  f.mread(c, 1);
+  EXPECT_EQ(c[0], 'I');
+  f.Seek(0);
+  f.mwrite("z", 1);
+  EXPECT_EQ(f.FileSize(false), 10);
+  f.SeekToEnd();
+  EXPECT_EQ(test::ReadFile(Path("p")), "zBCxyFGHIJ");
+
+  f.Seek(1);
+  f.mread(c, 1);
+  MFile g;
+  g.TakeOver(f);
+  EXPECT_FALSE(f.IsOpen());
+  g.mread(c, 1);
+  EXPECT_EQ(c[0], 'C');
+  g.mwrite("12", 2);  // pending when handed on
+  MFile h;
+  h.TakeOver(g);
+  h.mwrite("3", 1);
+  h.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("p")), "zBC123GHIJ");
+  EXPECT_EQ(h.GetMode(), MFile::kOpenOrCreate);
+}
+
+TEST_F(MFileTest, TruncateDropsPendingAndOldBytesAndLeavesTheFileThere) {
+  MFile f;
+  f.OpenFile(Path("t"), MFile::kCreate);
+  f.mwrite("abcdefgh", 8);
+  f.Seek(0);
+  char c[2];
+  f.mread(c, 2);   // read-ahead holds the whole file
+  f.mwrite("XY", 2);  // pending: committed before the cut
+  f.Truncate(3);
+  f.mwrite("z", 1);
+  f.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("t")), "abXz");
+  f.Truncate(0);
+  EXPECT_TRUE(f.IsEOF());
+  EXPECT_EQ(f.FileSize(), 0);
+}
+
+TEST_F(MFileTest, TypedItemsRoundTripInTheirByteLayout) {
+  const DateTimeValue date{2004, 3, 9, 14, 5, 7, 123456};
+  const CValue text = test::Value("naïve"), wide = test::Value(u"w\u00fc"), number = test::Value(-42),
+               when = test::Value(date);
+  const int32_t row[] = {7, -8};
+  MFile f;
+  f.OpenFile(Path("t"), MFile::kCreate);
+  f.WriteStr(CWStr(u"ab"));
+  f.WriteDate(date);
+  f.WriteShort(-2);
+  f.WriteDouble(2.5);
+  f.WriteStrW(u"\u4e2d");
+  f.WriteItemRow(row);
+  for (const CValue* v : {&text, &wide, &number, &when}) f.WriteValue(*v);
+  f.MCommit();
+  EXPECT_EQ(test::ReadFile(Path("t")).substr(0, 22),
+            std::string("\x02\x00\x61\x00\x62\x00"
+                        "\xD4\x07\x03\x00\x09\x00\x0E\x00\x05\x00\x07\x00\x40\xE2\x01\x00",
+                        22));
+
+  f.Seek(0);
+  CWStr ab;
+  f.ReadStr(ab);
+  EXPECT_EQ(std::u16string(ab.View()), u"ab");
+  EXPECT_EQ(f.ReadDate(), date);
+  EXPECT_EQ(f.ReadShort(), -2);
+  EXPECT_EQ(f.ReadDouble(), 2.5);
+  std::u16string chinese;
+  f.ReadStrW(chinese, 1);
+  EXPECT_EQ(chinese, u"\u4e2d");
+  int32_t back[2] = {};
+  CValue text2(VALUE_TYPE::AsciiString), wide2(VALUE_TYPE::UnicodeString);
+  CValue number2(VALUE_TYPE::Integer), when2(VALUE_TYPE::DateTime);
+  ASSERT_EQ(f.ReadRow(back, text2), 0);
+  f.ReadValue(wide2);
+  f.ReadValue(number2);
+  f.ReadValue(when2);
+  EXPECT_EQ(back[1], -8);
+  EXPECT_EQ(text2.Narrow(), "naïve");
+  EXPECT_EQ(wide2.Wide(), u"w\u00fc");
+  EXPECT_EQ(number2.GetInteger(), -42);
+  EXPECT_EQ(when2.GetDateTime(), date);
+  EXPECT_EQ(f.ReadRow(back, text2), 1);  // the end: nothing read
+}
+
 }  // namespace
 }  // namespace qm

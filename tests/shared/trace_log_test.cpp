@@ -27,6 +27,16 @@ std::tm Today() {
 // Time fields carry no leading zeros.
 const std::string kStamp = R"(\d{4}-[1-9]\d?-[1-9]\d? (0|[1-9]\d?):(0|[1-9]\d?):(0|[1-9]\d?))";
 
+TEST(TraceLineFormat, NoLeadingZerosAndOptionalArea) {
+  std::tm t{};
+  t.tm_year = 2004 - 1900, t.tm_mon = 2, t.tm_mday = 9, t.tm_hour = 14, t.tm_min = 5, t.tm_sec = 7;
+  EXPECT_EQ(TraceDate(t), "2004-3-9");
+  EXPECT_EQ(TraceLine(t, "Block.InsertRow", "Error inserting row"),
+            "2004-3-9 14:5:7 Block.InsertRow - Error inserting row\r\n");
+  t.tm_hour = t.tm_min = t.tm_sec = 0;
+  EXPECT_EQ(TraceLine(t, "", "text"), "2004-3-9 0:0:0  - text\r\n");
+}
+
 TEST(TraceFiles, OneFilePerModuleAndDay) {
   test::ConfiguredHome home;
   Trace(true, "SHARELIB_ERROR.Block.InsertRow", "Error inserting row");
@@ -41,6 +51,32 @@ TEST(TraceFiles, OneFilePerModuleAndDay) {
   const std::regex translating(kStamp +
                                " cmd.TranslateW - Translating. Statement: SELECT %s, Words: 3\r\n");
   EXPECT_TRUE(std::regex_match(test::TraceOf(home, "PILIB"), translating));
+}
+
+class TraceRollOver : public ::testing::Test {
+ protected:
+  void TearDown() override { SetTraceFileLimitForTesting(100'000'000); }
+  test::ConfiguredHome home_;
+};
+
+TEST_F(TraceRollOver, AFullDayFileContinuesInTheFirstNumberedFileWithRoom) {
+  SetTraceFileLimitForTesting(100);
+  const std::string date = TraceDate(Today());
+  const std::string base = home_.Home() + "Log/trace_ROLL_" + date;
+  test::WriteFile(base + ".log", std::string(100, '.'));  // at the limit: still used
+  Trace(true, "ROLL.A", "one");
+  test::WriteFile(base + "_1.log", std::string(101, '.'));
+  test::WriteFile(base + "_2.log", std::string(10, '.'));
+  Trace(true, "ROLL.A", "two");  // base.log is now above the limit, _1 too
+  Trace(true, "ROLL.A", "three");
+  if (TraceDate(Today()) != date) GTEST_SKIP() << "the day changed during the test";
+
+  EXPECT_NE(test::ReadFile(base + ".log").find(" A - one\r\n"), std::string::npos);
+  EXPECT_EQ(test::ReadFile(base + "_1.log"), std::string(101, '.'));
+  const std::string second = test::ReadFile(base + "_2.log");
+  EXPECT_NE(second.find(" A - two\r\n"), std::string::npos);
+  EXPECT_NE(second.find(" A - three\r\n"), std::string::npos);
+  EXPECT_FALSE(fs::exists(base + "_3.log"));
 }
 
 TEST(TraceFailures, NothingIsWrittenOrThrownWithoutAUsableLogFolder) {

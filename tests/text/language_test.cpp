@@ -325,5 +325,20 @@ TEST(Normalise, StepsRunAsAccentsStemmingTranslationPhonetic) {
   EXPECT_EQ(N(dutch, u"PHILIPS"), "FILIBS");  // translated before the sound map
 }
 
+TEST(Language, EveryShippedLanguageLoadsWithItsSteps) {
+  CLanguage language(ShippedLanguageFolder());
+  for (int32_t id = lngDanish; id <= lngRussian; ++id) {
+    SCOPED_TRACE(id);
+    language.LoadLanguage(id, true, true, true, true, true);
+    EXPECT_TRUE(language.IsLoaded());
+    EXPECT_EQ(language.GetLanguage(), id);
+    EXPECT_EQ(language.GetOptions(), 31);
+    EXPECT_FALSE(language.Normalise(std::u16string_view(u"INFORMATION")).empty());
+  }
+  language.LoadLanguage(lngOther, true, false, false, false, true);
+  EXPECT_TRUE(language.IsLoaded());
+  EXPECT_EQ(language.GetOptions(), CLanguage::kUseStopWords | CLanguage::kUseCharacterTranslation);
+}
+
 }  // namespace
 }  // namespace qm::test

@@ -164,8 +164,7 @@ TEST_F(ConnectionTest, UnreachableSilentAndForeignAddressesFail) {
   const std::string secret = dir_.Path() + "secret.txt";
   test::WriteFile(secret, "private");
   for (const std::string& address :
-       {"file://" + secret, "ftp://127.0.0.1:" + std::to_string(Server().Port()) + "/x",
-        std::string("gopher://127.0.0.1/"), std::string("not an address")}) {
+       {"file://" + secret, "ftp://127.0.0.1:" + std::to_string(Server().Port()) + "/x"}) {
     EXPECT_EQ(FailureText([&] { c.OpenConnection(address); }), kTimeoutText) << address;
   }
 

@@ -29,8 +29,7 @@ TEST_F(ColumnParserTest, FindexColumnsWithTagsRepeatedColumnsReplaced) {
 }
 
 TEST_F(ColumnParserTest, RejectedFindexListsLeaveTheMapAsItWas) {
-  for (const char16_t* list : {u"", u"  ", u",a", u"a,,b", u"a,", u":X=1", u"a:X", u"a:",
-                               u"a::X=1", u"a:=3", u"\"a", u"a:X=\"1", u"\"\":X=1"}) {
+  for (const char16_t* list : {u"  ", u"a,,b", u"a,", u"a:X", u"a:=3", u"a:X=\"1", u"\"\":X=1"}) {
     SCOPED_TRACE(Utf16ToUtf8(list));
     ColumnMap columns{{"kept", {}}};
     try {

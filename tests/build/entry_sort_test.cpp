@@ -132,20 +132,6 @@ TEST_F(EntrySortTest, EveryTypeSortsByValueThenKeyStablyAcrossMergePasses) {
   EXPECT_TRUE(home_.WorkFiles().empty());
 }
 
-TEST_F(EntrySortTest, OneArrayMakesOneRunAndOnePassAndNothingMakesAnEmptyFile) {
-  CEntrySort sort(home_.Defs(), SortEntryLayout(2, VALUE_TYPE::AsciiString),
-                  CEntrySort::Module::PiSort);
-  test::ExpectSortedAndStable(SortRandom(VALUE_TYPE::AsciiString, 8192, &sort), 1);
-  EXPECT_EQ(sort.LevelOneRuns(), 1);
-  EXPECT_EQ(sort.MergePasses(), 1);
-  EXPECT_EQ(TurnsLeft(), std::vector<std::string>{"1"});
-
-  EXPECT_TRUE(SortRandom(VALUE_TYPE::Integer, 0, &sort).empty());
-  EXPECT_EQ(sort.LevelOneRuns(), 0);
-  EXPECT_EQ(TurnsLeft(), (std::vector<std::string>{"1", "0"}));
-  EXPECT_TRUE(home_.WorkFiles().empty());
-}
-
 TEST_F(EntrySortTest, ArraysThatCannotBeAllocatedRaiseErrorElevenAndLeaveNoFile) {
   const SortEntryLayout layout(1, VALUE_TYPE::Integer);
   MFile raw;

@@ -133,11 +133,6 @@ TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile)
   Run("INSERT INTO " + real_keys + " VALUES (7.0, 'x'), (2.5, 'y')");
   EXPECT_EQ(Failure(Findex(real_keys, {{"title", {}}}, 6)).first, "Unique key is not numeric" + suffix);
 
-  CIndexHeader dated = Findex(nulls, {{"title", {}}}, 6);
-  dated.UpdateFlags = 1;
-  dated.DateTimeKeyColumn = "title";
-  EXPECT_EQ(Failure(dated).first, "DateTime key is not a datetime column" + suffix);
-
   const std::string empty = Table("id INTEGER, title TEXT");
   const auto [none, number] = Failure(Findex(empty, {{"title", {}}}, 6));
   EXPECT_EQ(number, 47);

@@ -5,53 +5,6 @@
 namespace qm::test {
 namespace {
 
-TEST_F(TranslatorTest, DefinitionsWithKeywordsInAnyCase) {
-  index_options.GeneralFlags = 3;
-  order_options.IgnoreChars = u"-";
-  Translate("create findex Books on table books columns title:CONTENT_WEIGHT=3,body KEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdFindexDefined);
-  EXPECT_EQ(cmd.Create(), 1);
-  EXPECT_EQ(cmd.Rebuild(), 1);
-  EXPECT_EQ(findex.IndexName, "Books");
-  EXPECT_EQ(findex.TableName, "books");
-  EXPECT_EQ(findex.KeyColumn, "id");
-  EXPECT_EQ(findex.Columns, (ColumnMap{{"body", {}}, {"title", {{"CONTENT_WEIGHT", "3"}}}}));
-  // The engine's current options go with every statement.
-  EXPECT_EQ(findex.GeneralFlags, 3);
-  EXPECT_EQ(order.IgnoreChars, u"-");
-
-  // Order columns keep the statement's order.
-  Translate("CREATE ORDER ByTitle ON TABLE books COLUMNS title, year,author KEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdOrderDefined);
-  EXPECT_EQ(order.OrderName, "ByTitle");
-  EXPECT_EQ(order.KeyColumn, "id");
-  EXPECT_EQ(order.ColumnNames(), "title,year,author");
-}
-
-TEST_F(TranslatorTest, StoredDefinitionFormsSetCreateAndRebuild) {
-  struct Case {
-    const char* statement;
-    int32_t type;
-    int16_t create, rebuild;
-  };
-  for (const Case& c : {Case{"CREATE FINDEX Books", kCmdFindexStored, 1, 1},
-                        Case{"UPDATE FINDEX Books", kCmdFindexStored, 0, 0},
-                        Case{"UPDATE FINDEX Books REBUILD", kCmdFindexStored, 0, 1},
-                        Case{"UPDATE ORDER ByTitle rebuild", kCmdOrderStored, 0, 1},
-                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id", kCmdFindexDefined, 0, 0},
-                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id REBUILD",
-                             kCmdFindexDefined, 0, 1},
-                        Case{"DROP FINDEX Books and more", kCmdDropFindex, 0, 0},
-                        Case{"drop order ByTitle", kCmdDropOrder, 0, 0},
-                        Case{"DROP THING x", kCmdNotRecognised, 0, 0}}) {
-    SCOPED_TRACE(c.statement);
-    Translate(c.statement);
-    EXPECT_EQ(cmd.CmdType(), c.type);
-    EXPECT_EQ(cmd.Create(), c.create);
-    EXPECT_EQ(cmd.Rebuild(), c.rebuild);
-  }
-}
-
 TEST_F(TranslatorTest, ColumnWordsAreJoinedWithoutBlanksAcrossLines) {
   Translate("CREATE FINDEX Books ON TABLE t COLUMNS a b KEY id");
   EXPECT_EQ(findex.Columns, (ColumnMap{{"ab", {}}}));

@@ -1,6 +1,5 @@
-// Findex builds in a data directory: files under upper-cased names, rebuilds,
-// builds without entries, failures that leave the old findex and no
-// temporary file, drops, and readers during rebuilds.
+// Findex builds in a data directory: builds without entries, failures that
+// leave the old findex and no temporary file, and readers during rebuilds.
 #include <gtest/gtest.h>
 
 #include <atomic>

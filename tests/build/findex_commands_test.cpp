@@ -1,6 +1,6 @@
-// The engine's work on existing findexes and orders, given as header files:
-// information values summed over add-ons, existence, stored options, the
-// option check of updates, and drops waiting for their locks.
+// The engine's work on existing findexes, given as header files: existence,
+// stored options, the option check of updates, and drops waiting for their
+// locks.
 #include <gtest/gtest.h>
 
 #include <chrono>

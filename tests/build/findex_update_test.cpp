@@ -1,8 +1,7 @@
 // Updates of findexes from real data sources through the command object: the
 // word-count thresholds between a rebuild and the add-on findexes, add-ons
 // built with the stored definition and options, files an update must leave
-// byte for byte, updates by the date/time key, deleted keys, and the swap of
-// an add-on under its findex's lock.
+// byte for byte, updates by the date/time key, and deleted keys.
 #include <gtest/gtest.h>
 
 #include <chrono>

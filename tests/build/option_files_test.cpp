@@ -131,13 +131,9 @@ TEST_F(OptionTest, LoadingStartsFromTheDefaultsAndSkipsDamagedFiles) {
   ASSERT_EQ(command_->LoadDefaultIndexOptions(), S_OK);
   ASSERT_EQ(command_->LoadDefaultOrderOptions(), S_OK);
   EXPECT_EQ(Get(&APICommand::GetIndexLanguageOption, iloLanguage), "7");
-  EXPECT_EQ(Get(&APICommand::GetIndexLanguageOption, iloUseStemming), "1");
   EXPECT_EQ(Get(&APICommand::GetIndexGeneralOption, igoIndexMaxSize), "0");
-  EXPECT_EQ(Get(&APICommand::GetIndexGeneralOption, igoSupportPhrases), "1");
   EXPECT_EQ(Get(&APICommand::GetIndexUpdateOption, iuoUpdateSupport), "0");
-  EXPECT_EQ(Get(&APICommand::GetOrderGeneralOption, ogoIgnorreCase), "0");
   EXPECT_EQ(Get(&APICommand::GetOrderUpdateOption, ouoUpdateSupport), "2");
-  EXPECT_EQ(Get(&APICommand::GetOrderUpdateOption, ouoUseDateTimeKey), "1");
 
   // igoUseUnicode is never set by a setter but is reported from the file.
   test::WriteFile(config + "igo.dat", Int32(32 | 2) + Int32(0) + Int32(0) + WideString(u""));

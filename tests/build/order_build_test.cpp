@@ -1,6 +1,5 @@
-// The order builder on its own: updates through the other PostgreSQL driver
-// than the build's, refusals, names that become file names, damaged files,
-// locks, and what failures leave behind.
+// The order builder on its own: refusals, names that become file names,
+// damaged files, locks, and what failures leave behind.
 #include <gtest/gtest.h>
 #include <unistd.h>
 
@@ -111,13 +110,6 @@ class OrderBuildTest : public test::SourceRowsTest {
 // The rules below do not depend on the driver.
 class OrderBuildTestSqlite : public OrderBuildTest {};
 INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTestSqlite, ::testing::Values(Source::SQLite),
-                         test::SourceName);
-
-// The two PostgreSQL drivers give the same text columns narrow (ANSI) and
-// wide (Unicode): an order built through one and updated through the other.
-class OrderBuildTestPostgres : public OrderBuildTest {};
-INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTestPostgres,
-                         ::testing::Values(Source::PostgresAnsi, Source::PostgresUnicode),
                          test::SourceName);
 
 TEST_P(OrderBuildTestSqlite, UpdatesThatChangeTheDefinitionAreRefusedUnlessRebuilt) {

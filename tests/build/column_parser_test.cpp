@@ -10,13 +10,12 @@ using ColumnParserTest = TranslatorTest;  // for the shipped error texts
 TEST_F(ColumnParserTest, FindexColumnsWithTagsRepeatedColumnsReplaced) {
   ColumnMap columns{{"stale", {}}};
   ParseFindexColumns(
-      u" title : CONTENT_WEIGHT = 3 :CONTENT_TYPE=URL:BASE_URL=\"http://host:8080/docs/\","
-      u"\"body, text\":DOCUMENT_TYPE=\"a\"\"b\",page:BASE_URL=\"http://h/?a=b\",zeta",
+      u" title : CONTENT_WEIGHT = 3 :BASE_URL=\"http://host:8080/docs/\","
+      u"\"body, text\":DOCUMENT_TYPE=\"a\"\"b\",zeta",
       columns, "CreateFindex");
   const ColumnMap expected{
       {"body, text", {{"DOCUMENT_TYPE", "a\"b"}}},
-      {"page", {{"BASE_URL", "http://h/?a=b"}}},
-      {"title", {{"BASE_URL", "http://host:8080/docs/"}, {"CONTENT_TYPE", "URL"}, {"CONTENT_WEIGHT", "3"}}},
+      {"title", {{"BASE_URL", "http://host:8080/docs/"}, {"CONTENT_WEIGHT", "3"}}},
       {"zeta", {}}};
   EXPECT_EQ(columns, expected);
 

@@ -1,10 +1,9 @@
-// The deleted-key file of a findex: what deleting keys leaves on disk, byte by
-// byte; damaged and unreadable lists refused without being touched; failed
-// writes and replaces that keep the old list; the kind 1 locks taken.
+// The deleted-key file of a findex: damaged and unreadable lists refused
+// without being touched; failed writes and replaces that keep the old list;
+// the kind 1 locks taken.
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <climits>
 #include <cstdint>
 #include <filesystem>
 #include <initializer_list>
@@ -61,23 +60,6 @@ class DeletedKeyFileTest : public ::testing::Test {
   test::ConfiguredHome home_;
   CGlobalDefs defs_;
 };
-
-TEST_F(DeletedKeyFileTest, KeysAreKeptAscendingOnceUnderTheUpperCasedNameUntilDropped) {
-  DeleteKey(defs_, "articles", 17, true);
-  EXPECT_EQ(test::ReadFile(Del("ARTICLES")), Words({1, 17}));
-
-  // Signed order: negative keys and the extremes sort below and above.
-  for (int32_t key : {30, INT32_MAX, -5, INT32_MIN, 10, 30}) DeleteKey(defs_, "Books", key, false);
-  EXPECT_EQ(test::ReadFile(Del("BOOKS")), Words({5, INT32_MIN, -5, 10, 30, INT32_MAX}));
-  EXPECT_EQ(ReadDeletedKeys(defs_, "books"), (std::vector<int32_t>{INT32_MIN, -5, 10, 30, INT32_MAX}));
-  EXPECT_EQ(Files(), (std::vector<std::string>{"ARTICLES.del", "BOOKS.del"}));
-
-  // Dropping forgets a findex's keys alone; the next delete starts a new list.
-  DropDeletedKeys(defs_, "Books");
-  DropDeletedKeys(defs_, "books");  // nothing to drop is fine
-  EXPECT_FALSE(fs::exists(Del("BOOKS")));
-  EXPECT_EQ(ReadDeletedKeys(defs_, "articles"), std::vector<int32_t>{17});
-}
 
 TEST_F(DeletedKeyFileTest, DamagedListsAreRefusedAndKeptAsTheyWere) {
   const std::vector<std::pair<const char*, std::string>> damaged = {

@@ -105,10 +105,6 @@ class FindexUpdateTest : public test::DataSourceTest {
     }
     ASSERT_EQ(count(), times) << TraceText();
   }
-
-  // A findex name of this process alone: lock names are shared by every
-  // process, and these tests hold a findex's locks while other tests run.
-  static std::string HeldName() { return "Held" + std::to_string(getpid()); }
 };
 
 TEST_P(FindexUpdateTest, WordCountThresholdsChooseARebuildOrTheFirstAddOnWithRoom) {
@@ -370,7 +366,8 @@ TEST_P(FindexUpdateTest, DeletesInAnyOrderLeaveASortedListWithoutDuplicates) {
 TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   const std::string rows = Table("rows", "id integer, body varchar(100)");
   Insert(rows, WordRows(1, 10));
-  const std::string name = HeldName();
+  // Lock names are shared by every process: a findex name of this one alone.
+  const std::string name = "Held" + std::to_string(getpid());
   ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
   // A search holds the rebuild back just before it moves into place, after
   // it has read row 3.

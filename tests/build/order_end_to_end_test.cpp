@@ -111,14 +111,6 @@ TEST_P(OrderEndToEndTest, NumbersAndDatesMakeType1OrdersWithNullsAsTheHighestVal
                   {2, -4, kNull, 0, date(1999, 12, 31), date(23, 59, 58)},
                   {3, 7, Low(2.5), High(2.5), date(2024, 2, 29), date(13, 45, 59)}}));
   EXPECT_EQ(Info("Prices", odrTypeName), "integer");
-
-  // The API's form: the SQL is the table, stored lower-cased.
-  ASSERT_EQ(command_->CreateOrder(T("Years"), T("SELECT id, n FROM " + t), T("n"), T("id")), S_OK)
-      << LastError();
-  EXPECT_EQ(Info("Years", odrSQLUsedAsTable), "yes");
-  EXPECT_EQ(Info("Years", odrSQLSelect), "select id, n from " + t);
-  EXPECT_EQ(Info("Years", odrDBConnectionString), "") << "not saved unless asked";
-  EXPECT_EQ(RowsOf("YEARS"), (Rows{{1, kNull}, {2, -4}, {3, 7}}));
   EXPECT_TRUE(fs::is_empty(GroupFolder() + "WorkData"));
 }
 
@@ -177,9 +169,6 @@ TEST_P(OrderEndToEndTest, UpdatesByKeyMergeRefuseOtherDefinitionsAndRebuildsStar
   OnSource({"update " + t + " set n = 50 where id = 1"});
   ASSERT_EQ(Run("CREATE ORDER Fruit"), "");  // a rebuild from the stored definition
   EXPECT_EQ(RowsOf("FRUIT"), (Rows{{1, 50}, {2, 3}, {3, 1}, {4, 9}}));
-
-  EXPECT_FALSE(Run("UPDATE ORDER Nothing").empty());
-  EXPECT_FALSE(fs::exists(OrderFolder() + "NOTHING.sri"));
 }
 
 TEST_P(OrderEndToEndTest, DateTimeKeyUpdatesReadOnlyLaterRowsAndReplaceTheRowsOfKeysReadAgain) {
@@ -233,17 +222,6 @@ TEST_P(OrderEndToEndTestSqlite, DropOrderRemovesEveryFileAndBackgroundBuildsRepo
   EXPECT_FALSE(Run("DROP ORDER Both").empty());
   ASSERT_EQ(command_->DropOrder(T("Single")), S_OK) << LastError();
   EXPECT_TRUE(OrderFiles().empty());
-
-  // No row: error 26 reported by the job.
-  const std::string empty = Table("empty", "id integer, a varchar(10)");
-  ASSERT_EQ(command_->ExecuteEx(T("CREATE ORDER None ON TABLE " + empty + " COLUMNS a KEY id"),
-                                VARIANT_FALSE),
-            S_OK);
-  test::WaitForJob(*command_);
-  EXPECT_EQ(ErrorNumber(), 1);
-  EXPECT_NE(ErrorMsg().find("No rows were selected for the order"), std::string::npos);
-  EXPECT_TRUE(OrderFiles().empty());
-  EXPECT_TRUE(fs::is_empty(GroupFolder() + "WorkData"));
 }
 
 }  // namespace

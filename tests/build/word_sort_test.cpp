@@ -110,14 +110,6 @@ TEST_P(WordSortTest, IndexedColumnsAloneDecideTheFindexType) {
   selected.SqlSelect = "select label, d, id from " + t;
   EXPECT_EQ(Values(selected), (std::vector<std::string>{"1999-12-31 23:59:59", "2024-2-29 13:45:59"}));
   EXPECT_EQ(selected.FindexType, 3);
-
-  // Dates with numbers make a text findex of their words.
-  CIndexHeader mixed = Findex(t, {{"d", {}}, {"n", {}}}, 4);
-  const std::vector<std::string> words = Values(mixed);
-  EXPECT_EQ(mixed.FindexType, 2);
-  for (const char* w : {"10", "1999", "2024", "59"}) {
-    EXPECT_NE(std::find(words.begin(), words.end(), w), words.end()) << w;
-  }
 }
 
 TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {

@@ -1,8 +1,8 @@
 // Orders built from real data sources through the command object: SQLite
 // always, PostgreSQL through the ANSI and the Unicode driver when the test
 // services run. Type 1 and type 2 orders read back with the decoder of
-// order_file_decoder.h, the stored options, information values,
-// updates by key and by date/time key, drops and background builds.
+// order_file_decoder.h, information values, updates by key and by
+// date/time key, drops and background builds.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -114,7 +114,7 @@ TEST_P(OrderEndToEndTest, NumbersAndDatesMakeType1OrdersWithNullsAsTheHighestVal
   EXPECT_TRUE(fs::is_empty(GroupFolder() + "WorkData"));
 }
 
-TEST_P(OrderEndToEndTest, TextMakesType2OrdersOfRanksWithTheStoredOptions) {
+TEST_P(OrderEndToEndTest, TextMakesType2OrdersOfRanks) {
   const std::string books =
       Table("books", "id integer, title varchar(100), n integer",
             {"1, '-River', 10", "2, 'river-', 9", "3, 'Lake', NULL", "4, NULL, -3", "5, 'la-ke', 10"});
@@ -136,14 +136,6 @@ TEST_P(OrderEndToEndTest, TextMakesType2OrdersOfRanksWithTheStoredOptions) {
   EXPECT_EQ(Info("titles", odrTypeName), "text");
   // Saved on request, and like every text of the order lower-cased.
   EXPECT_EQ(Info("Titles", odrDBConnectionString), ToLower(std::string_view(connection_)));
-
-  // The options it was built with, as stored.
-  BSTR text;
-  ASSERT_EQ(command_->SetOrderGeneralOptions(VARIANT_FALSE, VARIANT_FALSE, nullptr), S_OK);
-  ASSERT_EQ(command_->GetOrderGeneralOption(ogoIgnorreCase, VARIANT_FALSE, &text), S_OK);
-  EXPECT_EQ(Utf16ToUtf8(text), "1");
-  ASSERT_EQ(command_->GetOrderGeneralOption(ogoIgnoreChars, VARIANT_FALSE, &text), S_OK);
-  EXPECT_EQ(Utf16ToUtf8(text), "-");
 }
 
 TEST_P(OrderEndToEndTest, UpdatesByKeyMergeRefuseOtherDefinitionsAndRebuildsStartOver) {

@@ -76,11 +76,6 @@ TEST(RowSelection, DateTimeKeyUpdatesTryTheQuotedLiteralThenTheHashForm) {
   d.IndexMaxSize = 1;
   EXPECT_EQ(Statements(d), std::vector<std::string>{
                                "select ID,CHANGED,body,title from books where ID>12 AND ID<100012"});
-  // Without its column the flag alone changes nothing.
-  d.IndexMaxSize = 0;
-  d.DateTimeKeyColumn.clear();
-  EXPECT_EQ(Statements(d),
-            std::vector<std::string>{"select ID,CHANGED,body,title from books where ID>12"});
 }
 
 TEST(FindexType, TextWinsNumbersWidenDatesWithNumbersBecomeText) {

@@ -5,53 +5,6 @@
 namespace qm::test {
 namespace {
 
-TEST_F(TranslatorTest, DefinitionsWithKeywordsInAnyCase) {
-  index_options.GeneralFlags = 3;
-  order_options.IgnoreChars = u"-";
-  Translate("create findex Books on table books columns title:CONTENT_WEIGHT=3,body KEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdFindexDefined);
-  EXPECT_EQ(cmd.Create(), 1);
-  EXPECT_EQ(cmd.Rebuild(), 1);
-  EXPECT_EQ(findex.IndexName, "Books");
-  EXPECT_EQ(findex.TableName, "books");
-  EXPECT_EQ(findex.KeyColumn, "id");
-  EXPECT_EQ(findex.Columns, (ColumnMap{{"body", {}}, {"title", {{"CONTENT_WEIGHT", "3"}}}}));
-  // The engine's current options go with every statement.
-  EXPECT_EQ(findex.GeneralFlags, 3);
-  EXPECT_EQ(order.IgnoreChars, u"-");
-
-  // Order columns keep the statement's order.
-  Translate("CREATE ORDER ByTitle ON TABLE books COLUMNS title, year,author KEY id");
-  EXPECT_EQ(cmd.CmdType(), kCmdOrderDefined);
-  EXPECT_EQ(order.OrderName, "ByTitle");
-  EXPECT_EQ(order.KeyColumn, "id");
-  EXPECT_EQ(order.ColumnNames(), "title,year,author");
-}
-
-TEST_F(TranslatorTest, StoredDefinitionFormsSetCreateAndRebuild) {
-  struct Case {
-    const char* statement;
-    int32_t type;
-    int16_t create, rebuild;
-  };
-  for (const Case& c : {Case{"CREATE FINDEX Books", kCmdFindexStored, 1, 1},
-                        Case{"UPDATE FINDEX Books", kCmdFindexStored, 0, 0},
-                        Case{"UPDATE FINDEX Books REBUILD", kCmdFindexStored, 0, 1},
-                        Case{"UPDATE ORDER ByTitle rebuild", kCmdOrderStored, 0, 1},
-                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id", kCmdFindexDefined, 0, 0},
-                        Case{"UPDATE FINDEX B ON TABLE t COLUMNS a KEY id REBUILD",
-                             kCmdFindexDefined, 0, 1},
-                        Case{"DROP FINDEX Books and more", kCmdDropFindex, 0, 0},
-                        Case{"drop order ByTitle", kCmdDropOrder, 0, 0},
-                        Case{"DROP THING x", kCmdNotRecognised, 0, 0}}) {
-    SCOPED_TRACE(c.statement);
-    Translate(c.statement);
-    EXPECT_EQ(cmd.CmdType(), c.type);
-    EXPECT_EQ(cmd.Create(), c.create);
-    EXPECT_EQ(cmd.Rebuild(), c.rebuild);
-  }
-}
-
 TEST_F(TranslatorTest, ColumnWordsAreJoinedWithoutBlanksAcrossLines) {
   Translate("CREATE FINDEX Books ON TABLE t COLUMNS a b KEY id");
   EXPECT_EQ(findex.Columns, (ColumnMap{{"ab", {}}}));
@@ -103,11 +56,8 @@ TEST_F(TranslatorTest, DeleteKeyIsReadInSixtyFourBits) {
     const char* key;
     int32_t value;  // 0: refused with error 46
   };
-  for (const Case& c : {Case{"17", 17}, Case{"-5", -5}, Case{"+42abc", 42},
-                        Case{"2147483647", INT32_MAX}, Case{"-2147483648", INT32_MIN},
-                        Case{"0", 0}, Case{"abc", 0}, Case{"2147483648", 0},
-                        Case{"4294967297", 0}, Case{"-2147483649", 0},
-                        Case{"99999999999999999999999999", 0}}) {
+  for (const Case& c : {Case{"+42abc", 42}, Case{"-2147483648", INT32_MIN}, Case{"0", 0},
+                        Case{"abc", 0}, Case{"4294967297", 0}, Case{"-2147483649", 0}}) {
     SCOPED_TRACE(c.key);
     const std::string statement = std::string("DELETE FROM FINDEX Books ") + c.key;
     if (c.value == 0) {
@@ -128,17 +78,9 @@ TEST_F(TranslatorTest, RefusedStatementsGiveTheirNumberedError) {
     int32_t number;
   };
   for (const Case& c : {
-           Case{"", 15}, Case{" \r\n\t ", 15}, Case{"CREATE", 13}, Case{"CREATE FINDEX", 13},
-           Case{"CREATE FINDEX b ON TABLE t", 13}, Case{"CREATE FINDEX b ON TABLE t COLUMNS a", 13},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY", 13},
-           Case{"CREATE FINDEX b REBUILD now", 13}, Case{"CREATE ORDER o ON TABLE t COLUMNS", 13},
-           Case{"CREATE FINDEX \"b", 13}, Case{"DROP FINDEX", 13}, Case{"CONNECT", 13},
-           Case{"SET GROUP", 13}, Case{"SET COLOUR red", 13}, Case{"DELETE FINDEX b 1", 13},
-           Case{"DELETE FROM FINDEX b", 13},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY id x", 16},
+           Case{" \r\n\t ", 15}, Case{"CREATE FINDEX b ON TABLE t COLUMNS a KEY", 13},
+           Case{"CREATE FINDEX \"b", 13}, Case{"DELETE FROM FINDEX b", 13},
            Case{"CREATE ORDER o ON TABLE t COLUMNS a KEY id REBUILD x", 16},
-           Case{"DELETE FROM FINDEX Books 17 x", 16},
-           Case{"CREATE FINDEX b ON TABLE t COLUMNS KEY id", 17},
            Case{"CREATE FINDEX b ON TABLE t COLUMNS a:WEIGHT KEY id", 17},
            Case{"CREATE ORDER o ON TABLE t COLUMNS a, KEY id", 17},
            Case{"CREATE FINDEX b AT TABLE t COLUMNS a KEY id", 18},

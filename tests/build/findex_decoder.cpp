@@ -109,7 +109,6 @@ class Decoder {
     const std::string where = " in block " + std::to_string(block);
     if (level == 3) {
       out_.leaves.push_back(block);
-      auto& values = out_.leaf_values[block];
       while (pos < limit) {
         auto value = DecodeValue(sdx_, pos, limit, type_);
         if (!value || pos + 4 > limit) return Fault("leaf row cut" + where), std::nullopt;
@@ -117,9 +116,8 @@ class Decoder {
         positions_.push_back(LoadInt32(sdx_, pos));
         pos += 4;
         out_.words.push_back(Word{*value, {}});
-        values.push_back(*value);
       }
-      return values.back();
+      return out_.words.back().value;
     }
     ++out_.nodes_per_level[level];
     DecodedNode node;
@@ -270,19 +268,6 @@ DecodedFindex DecodeFindex(const std::string& sdx_path, const std::string& fst_p
   DecodedFindex out;
   Decoder(sdx_path, fst_path, type, flags, out).Run();
   return out;
-}
-
-int32_t DescendTo(const DecodedFindex& findex, const WordValue& value) {
-  int32_t block = 1;
-  for (int level = 0; level < 3; ++level) {
-    const auto it = findex.nodes.find(block);
-    if (it == findex.nodes.end()) return block;  // the empty end leaf
-    const DecodedNode& node = it->second;
-    std::size_t i = 0;
-    while (i < node.separators.size() && node.separators[i] < value) ++i;
-    block = node.children[std::min(i, node.children.size() - 1)];
-  }
-  return block;
 }
 
 }  // namespace qm::test

@@ -74,19 +74,15 @@ struct DecodedFindex {
   std::vector<int32_t> leaves;  // non-empty leaves in tree order
   std::vector<int32_t> nodes_per_level{0, 0, 0};
   std::map<int32_t, DecodedNode> nodes;
-  std::map<int32_t, std::vector<WordValue>> leaf_values;
   // Every rule of the layout that the files break, in words.
   std::vector<std::string> faults;
 };
 
 // Decodes a findex of the given type and general flags: the header fields it
-// needs, the four-level tree from block 1, the leaf chain and every posting
-// list, checking the layout on the way.
+// needs, the four-level tree from block 1 (each separator the highest value
+// below it, so a search descends to the right leaf), the leaf chain and every
+// posting list, checking the layout on the way.
 DecodedFindex DecodeFindex(const std::string& sdx_path, const std::string& fst_path, int32_t type,
                            int32_t flags);
-
-// The leaf a search for value descends to: in each node the child before
-// the first separator not below the value, else the last child.
-int32_t DescendTo(const DecodedFindex& findex, const WordValue& value);
 
 }  // namespace qm::test

@@ -117,15 +117,6 @@ TEST_P(FindexEndToEndTest, NumberAndDateColumnsMakeTypedFindexes) {
     EXPECT_EQ(findex.findex_type, type);
     EXPECT_EQ(findex.words, (std::vector<test::Word>{{c.first, {{1, 0}}}, {c.second, {{2, 0}}}}));
   }
-  // A findex over an SQL select (CreateFindex) stores the select lower-cased.
-  const std::string select = "SELECT ID, AMOUNT FROM " + values + " WHERE AMOUNT > 15";
-  ASSERT_EQ(command_->CreateFindex(T("Selected"), T(select), T("amount"), T("id")), S_OK)
-      << LastError();
-  EXPECT_EQ(Info("Selected", idxSQLUsedAsTable), "Yes");
-  EXPECT_EQ(Info("Selected", idxSQLSelect),
-            "select id, amount from " + values + " where amount > 15");
-  EXPECT_EQ(Info("Selected", idxKeyCount), "1");
-  EXPECT_EQ(Info("Selected", idxTableName), "");
 }
 
 TEST_P(FindexEndToEndTest, NullAndNonNumericKeysAreRefused) {

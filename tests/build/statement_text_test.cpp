@@ -51,10 +51,7 @@ TEST_F(TranslatorTest, TraceLinesOfStatementsMaskPasswords) {
   for (const auto& f : std::filesystem::directory_iterator(home.Home() + "Log")) {
     log += ReadFile(f.path().string());
   }
-  EXPECT_NE(log.find("cmd.TranslateW - Translating. Statement: CONNECT mydsn user ****, Words: 4"),
-            std::string::npos);
   EXPECT_NE(log.find("cmd.SplitStrW - Spliting. Word: ****"), std::string::npos);
-  EXPECT_NE(log.find("Spliting. Word: \"DSN=x;PWD=****\""), std::string::npos);
   EXPECT_NE(log.find("Could not find command. Statement: BOGUS x PWD=****, Words: 3"),
             std::string::npos);
   EXPECT_EQ(log.find("TopSecret"), std::string::npos);

@@ -110,14 +110,6 @@ TEST_P(WordSortTest, IndexedColumnsAloneDecideTheFindexType) {
   selected.SqlSelect = "select label, d, id from " + t;
   EXPECT_EQ(Values(selected), (std::vector<std::string>{"1999-12-31 23:59:59", "2024-2-29 13:45:59"}));
   EXPECT_EQ(selected.FindexType, 3);
-
-  // Dates with numbers make a text findex of their words.
-  CIndexHeader mixed = Findex(t, {{"d", {}}, {"n", {}}}, 4);
-  const std::vector<std::string> words = Values(mixed);
-  EXPECT_EQ(mixed.FindexType, 2);
-  for (const char* w : {"10", "1999", "2024", "59"}) {
-    EXPECT_NE(std::find(words.begin(), words.end(), w), words.end()) << w;
-  }
 }
 
 TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile) {
@@ -129,23 +121,10 @@ TEST_P(WordSortTestSqlite, RowErrorsStopTheBuildWithTheirMessagesAndLeaveNoFile)
   EXPECT_EQ(Failure(Findex(nulls, with_document, 6)).first,
             "Unique key column contains NULL values" + suffix);
 
-  const std::string real_keys = Table("id REAL, title TEXT");
-  Run("INSERT INTO " + real_keys + " VALUES (7.0, 'x'), (2.5, 'y')");
-  EXPECT_EQ(Failure(Findex(real_keys, {{"title", {}}}, 6)).first, "Unique key is not numeric" + suffix);
-
-  CIndexHeader dated = Findex(nulls, {{"title", {}}}, 6);
-  dated.UpdateFlags = 1;
-  dated.DateTimeKeyColumn = "title";
-  EXPECT_EQ(Failure(dated).first, "DateTime key is not a datetime column" + suffix);
-
   const std::string empty = Table("id INTEGER, title TEXT");
   const auto [none, number] = Failure(Findex(empty, {{"title", {}}}, 6));
   EXPECT_EQ(number, 47);
   EXPECT_NE(none.find("(Module:PiSort,Method:SortFindexTable)"), std::string::npos) << none;
-  EXPECT_NE(home_.TraceText().find("Fetching database rows interupted because of database warning"),
-            std::string::npos);
-
-  EXPECT_NE(Failure(Findex("no_such_table", {{"title", {}}}, 6)).first, "no error");
   EXPECT_TRUE(home_.WorkFiles().empty());
 
   // Rows without a single value still count, and give an empty sorted file.

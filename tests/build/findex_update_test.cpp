@@ -90,6 +90,24 @@ class FindexUpdateTest : public test::DataSourceTest {
     for (int32_t k = from; k <= to; ++k) keys.insert(k);
     return keys;
   }
+  // Waits until line has been traced times times: "Renaming index: NAME" is
+  // written when a build's files are complete and about to move into place.
+  void WaitForTrace(std::string_view line, int times) {
+    auto count = [&] {
+      const std::string text = TraceText();
+      int n = 0;
+      for (auto at = text.find(line); at != std::string::npos; at = text.find(line, at + 1)) ++n;
+      return n;
+    };
+    for (int i = 0; i < 30000 && count() < times; ++i) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    }
+    ASSERT_EQ(count(), times) << TraceText();
+  }
+
+  // A findex name of this process alone: lock names are shared by every
+  // process, and these tests hold a findex's locks while other tests run.
+  static std::string HeldName() { return "Held" + std::to_string(getpid()); }
 };
 
 TEST_P(FindexUpdateTest, WordCountThresholdsChooseARebuildOrTheFirstAddOnWithRoom) {
@@ -351,24 +369,14 @@ TEST_P(FindexUpdateTest, DeletesInAnyOrderLeaveASortedListWithoutDuplicates) {
 TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   const std::string rows = Table("rows", "id integer, body varchar(100)");
   Insert(rows, WordRows(1, 10));
-  // Lock names are shared by every process: a findex name of this one alone.
-  const std::string name = "Held" + std::to_string(getpid());
+  const std::string name = HeldName();
   ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
   // A search holds the rebuild back just before it moves into place, after
   // it has read row 3.
   CLockManager search("PUBLIC", name, kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name + " REBUILD"), 0), S_OK);
-  // "Renaming index" is traced when a build's files are complete: the
-  // CREATE's, then the rebuild's.
-  const std::string renaming = "Renaming index: " + name;
-  auto renamed = [&] {
-    const std::string text = TraceText();
-    return text.find(renaming) != text.rfind(renaming);
-  };
-  for (int i = 0; i < 30000 && !renamed(); ++i)
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-  ASSERT_TRUE(renamed()) << TraceText();
+  WaitForTrace("Renaming index: " + name, 2);  // the CREATE's, then the rebuild's
   OnSource({"delete from " + rows + " where id = 3"});
   APICommand deleter;
   ASSERT_EQ(deleter.SetDataPath(T(home_.Data())), S_OK);
@@ -393,6 +401,60 @@ INSTANTIATE_TEST_SUITE_P(Sources, FindexUpdateTest,
                          ::testing::Values(Source::SQLite, Source::PostgresAnsi,
                                            Source::PostgresUnicode),
                          SourceName);
+
+TEST_P(FindexUpdateTest, DateTimeFractionsReachTheLiteralOnlyWhenAsked) {
+  const std::string timed = Table("timed", "id integer, body varchar(100), changed timestamp");
+  std::vector<std::string> values;
+  for (const std::string& row : WordRows(1, 699)) values.push_back(row + ", '2024-05-06 07:08:09'");
+  values.push_back("700, 'quarter second', '2024-05-06 07:08:09.25'");
+  Insert(timed, values);
+  const std::string select = "SELECT id, body, changed FROM " + timed;
+  ASSERT_EQ(command_->SetIndexUpdateOptions(0, VARIANT_TRUE, VARIANT_TRUE), S_OK);
+  ASSERT_EQ(command_->CreateFindexEx(T("Fraction"), T(select), T("body"), T("id"), VARIANT_TRUE,
+                                     T("changed")),
+            S_OK)
+      << LastError();
+  ASSERT_EQ(command_->SetIndexUpdateOptions(0, VARIANT_TRUE, 0), S_OK);
+  ASSERT_EQ(command_->CreateFindexEx(T("Whole"), T(select), T("body"), T("id"), VARIANT_TRUE,
+                                     T("changed")),
+            S_OK)
+      << LastError();
+  EXPECT_EQ(Header("FRACTION").MaxDateTimeKey, (DateTimeValue{2024, 5, 6, 7, 8, 9, 250000000}));
+
+  Insert(timed, {"701, 'half second', '2024-05-06 07:08:09.5'"});
+  ASSERT_EQ(Run("UPDATE FINDEX Fraction"), "");
+  ASSERT_EQ(Run("UPDATE FINDEX Whole"), "");
+  EXPECT_NE(TraceText().find("where changed>'2024-05-06 07:08:09.250000000'"), std::string::npos);
+  EXPECT_EQ(Keys("FRACTION_ADD_1"), std::set<int32_t>{701});
+  EXPECT_EQ(Header("FRACTION_ADD_1").MaxDateTimeKey,
+            (DateTimeValue{2024, 5, 6, 7, 8, 9, 500000000}));
+  // Cut to the second, the literal lies below the quarter second row too.
+  EXPECT_EQ(Keys("WHOLE_ADD_1"), (std::set<int32_t>{700, 701}));
+}
+
+TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
+  const std::string rows = Table("rows", "id integer, body varchar(100)");
+  Insert(rows, WordRows(1, 700));
+  const std::string name = HeldName();
+  ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
+  Insert(rows, WordRows(701, 703));
+  // A search of the findex holds a reader unit of its findex lock; the add-on
+  // files are read under that lock.
+  CLockManager search("PUBLIC", name, kLockFindex);
+  search.LockReader();
+  ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name), 0), S_OK);
+  const std::string add_on = ToUpper(name) + "_ADD_1";
+  WaitForTrace("Renaming index: " + add_on, 1);
+  for (int i = 0; i < 50; ++i) {
+    EXPECT_FALSE(Exists(add_on + ".sdx"));
+    EXPECT_LT(Progress(), 100);
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  search.UnlockReaders();
+  test::WaitForJob(*command_);
+  EXPECT_EQ(ErrorNumber(), 0) << ErrorMsg();
+  EXPECT_EQ(Keys(add_on), Range(701, 703));
+}
 
 }  // namespace
 }  // namespace qm

@@ -269,5 +269,66 @@ TEST_P(OrderBuildTestSqlite, MovesAndDropsWaitForTheReadersOfTheOrder) {
   EXPECT_EQ(ColumnOf("LOCKED", "LABEL"), (Entries{{"x", {1}}, {"y", {2}}}));
 }
 
+// The two PostgreSQL drivers give the same text columns narrow (ANSI) and
+// wide (Unicode): an order built through one and updated through the other.
+class OrderBuildTestPostgres : public OrderBuildTest {};
+INSTANTIATE_TEST_SUITE_P(Sources, OrderBuildTestPostgres,
+                         ::testing::Values(Source::PostgresAnsi, Source::PostgresUnicode),
+                         test::SourceName);
+
+TEST_P(OrderBuildTestPostgres, UpdatesKeepTheStoredTextFormWhateverFormTheDriverGives) {
+  const Source other =
+      GetParam() == Source::PostgresAnsi ? Source::PostgresUnicode : Source::PostgresAnsi;
+  if (test::PostgresConnection(other).empty()) GTEST_SKIP() << "needs both PostgreSQL drivers";
+  const bool wide = GetParam() == Source::PostgresUnicode;
+  const std::string t = Table("id INTEGER, label VARCHAR(20)");
+  Run("INSERT INTO " + t + " VALUES (1, 'ｆig'), (2, 'Äpfel'), (3, 'apple')");
+  auto order = [&] {
+    COrderInfo d = Order("Forms", t, {"label"});
+    d.GeneralFlags = 1;  // ignore case
+    d.IgnoreChars = u"-";
+    return d;
+  };
+  COrderInfo built = order();
+  Build(built);
+  ASSERT_EQ(test::DecodeOrderHeader(File("FORMS.sri")).columns.at(0).type, wide ? 4 : 2);
+
+  home_.Defs().SetConnectionString(test::PostgresConnection(other), "test");
+  Run("INSERT INTO " + t + " VALUES (4, '-äpfel'), (5, '😀'), (6, 'APPLE-')");
+  COrderInfo update = order();
+  update.IgnoreChars.clear();  // the stored order's preparation applies
+  ASSERT_EQ(Failure(update, false), "no error");
+
+  EXPECT_EQ(test::DecodeOrderHeader(File("FORMS.sri")).columns.at(0).type, wide ? 4 : 2);
+  // Values read in the other form are prepared and meet their stored equals;
+  // the stored form's comparison places them: U+FF26 (EF BC A6) before
+  // U+1F600 (F0 ...) in UTF-8, after it (D83D ...) in UTF-16.
+  const Entries narrow_order{{"APPLE", {3, 6}}, {"ÄPFEL", {2, 4}}, {"ＦIG", {1}}, {"😀", {5}}};
+  const Entries wide_order{{"APPLE", {3, 6}}, {"ÄPFEL", {2, 4}}, {"😀", {5}}, {"ＦIG", {1}}};
+  EXPECT_EQ(ColumnOf("FORMS", "LABEL"), wide ? wide_order : narrow_order);
+  const int32_t fig = wide ? 3 : 2;
+  const int32_t smiley = wide ? 2 : 3;
+  EXPECT_EQ(RowsOf("FORMS"), (Rows{{1, fig}, {2, 1}, {3, 0}, {4, 1}, {5, smiley}, {6, 0}}));
+  EXPECT_TRUE(home_.WorkFiles().empty());
+}
+
+TEST_P(OrderBuildTestSqlite, AKeyReadTwiceKeepsTheLastRowReadForIt) {
+  const std::string t = Table("seq INTEGER, id INTEGER, label VARCHAR(10), n INTEGER");
+  Run("INSERT INTO " + t + " VALUES (1, 7, 'b', 1), (2, 3, 'a', 2), (3, 7, 'c', 5)");
+  for (bool text : {false, true}) {
+    COrderInfo d = Order(text ? "Twice2" : "Twice1", t, {text ? "label" : "n"});
+    d.SqlUsedAsTable = 1;
+    d.SqlSelect = "select id, label, n from " + t + " order by seq";
+    Build(d);
+    EXPECT_EQ(d.Count, 2);
+    if (text) {
+      EXPECT_EQ(ColumnOf("TWICE2", "LABEL"), (Entries{{"a", {3}}, {"c", {7}}}));
+      EXPECT_EQ(RowsOf("TWICE2"), (Rows{{3, 0}, {7, 1}}));
+    } else {
+      EXPECT_EQ(RowsOf("TWICE1"), (Rows{{3, 2}, {7, 5}}));
+    }
+  }
+}
+
 }  // namespace
 }  // namespace qm

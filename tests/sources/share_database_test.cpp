@@ -470,5 +470,62 @@ TEST_F(PostgresTest, LostConnectionInMidResultFailsInsteadOfEnding) {
   EXPECT_LT(rows, 1000);
 }
 
+TEST_P(SourceTest, TextOutsideLatin1PassesWholeInStatementsNamesValuesAndMessages) {
+  CShareDatabase db(defs_);
+  db.Connect();
+  EXPECT_EQ(db.UsesWideCalls(), Wide());
+  const std::string t = UniqueTable("names");
+  const std::string word = "Grüße 中文 😀";
+  // Pieces of 4-byte characters (or surrogate pairs) end inside them.
+  std::string astral = "a";
+  for (int i = 0; i < 3000; ++i) astral += "😀";
+  Run(db, "CREATE TABLE " + t + " (id INTEGER, \"Größe\" VARCHAR(40), astral TEXT)");
+  Run(db, "INSERT INTO " + t + " VALUES (1, '" + word + "', '" + astral + "')");
+  Run(db, "INSERT INTO " + t + " VALUES (2, 'other', NULL)");
+  // The literal must reach the data source as written to find its row.
+  int16_t n = 0;
+  db.ExecuteSql("SELECT id, \"Größe\", astral FROM " + t + " WHERE \"Größe\" = '" + word + "'",
+                n);
+  EXPECT_EQ(db.GetColumnDescription(2).name, "Größe");
+  ASSERT_EQ(db.GetColumnIndex("größe"), 2);
+  db.AllocateCache();
+  db.CacheColumns();
+  CValue v;
+  db.GetColumnValueFromCache(1, VALUE_TYPE::Integer, v);
+  EXPECT_EQ(v.GetInteger(), 1);
+  db.GetColumnValueFromCache("Größe", VALUE_TYPE::AsciiString, v);
+  EXPECT_EQ(v.Narrow(), word);
+  db.GetColumnValueFromCache("astral", VALUE_TYPE::AsciiString, v);
+  EXPECT_EQ(v.Narrow(), astral.substr(0, 1 + 1999 * 4));  // 2,000 whole characters
+  EXPECT_EQ(db.MoveNext(), 1);
+
+  // The driver's own message quotes the name as written.
+  const std::string missing = "kein_größe_表";
+  ErrorText([&] { db.ExecuteSql("SELECT x FROM " + missing, n); });
+  EXPECT_NE(db.GetLastDiagnostic().find(missing), std::string::npos) << db.GetLastDiagnostic();
+  Run(db, "DROP TABLE " + t);
+}
+
+TEST_F(DatabaseTest, BinaryColumnWithoutWorkFolderFailsWithTheCause) {
+  UseSqlite();
+  CGlobalDefs no_data_path;  // nowhere to put the binary copy
+  no_data_path.SetConnectionString(defs_.GetConnectionString(), "test");
+  CShareDatabase db(no_data_path);
+  db.Connect();
+  Run(db, "CREATE TABLE b (data BLOB)");
+  Run(db, "INSERT INTO b VALUES (X'01')");
+  int16_t n = 0;
+  db.ExecuteSql("SELECT data FROM b", n);
+  db.AllocateCache();
+  try {
+    db.CacheColumns();
+    FAIL() << "the copy cannot be made";
+  } catch (CShareDatabaseException& e) {
+    EXPECT_EQ(e.GetEntries().front().text,
+              u"General Error (Module:ShareDatabase,Method:CacheColumns)");
+    EXPECT_NE(FullText(e).find("Data path is not set"), std::string::npos) << FullText(e);
+  }
+}
+
 }  // namespace
 }  // namespace qm

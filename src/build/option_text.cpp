@@ -47,11 +47,21 @@ std::string IndexGeneralOptionText(const IndexOptions& options, int32_t option) 
   return out;
 }
 
-std::string IndexUpdateOptionText(const IndexOptions& options, int32_t option) {
-  if (option == iuoUpdateSupport) return std::to_string(options.UpdateSupport);
+namespace {
+
+// Findexes and orders share the update flags; each names its support option.
+std::string UpdateOptionText(int32_t flags, int32_t support, int32_t option,
+                             int32_t support_option) {
+  if (option == support_option) return std::to_string(support);
   std::string out;
-  BitText(options.UpdateFlags, option, {kUpdateUseDateTimeKey, kUpdateUseDateTimeFraction}, out);
+  BitText(flags, option, {kUpdateUseDateTimeKey, kUpdateUseDateTimeFraction}, out);
   return out;
+}
+
+}  // namespace
+
+std::string IndexUpdateOptionText(const IndexOptions& options, int32_t option) {
+  return UpdateOptionText(options.UpdateFlags, options.UpdateSupport, option, iuoUpdateSupport);
 }
 
 std::string OrderGeneralOptionText(const OrderOptions& options, int32_t option) {
@@ -62,10 +72,7 @@ std::string OrderGeneralOptionText(const OrderOptions& options, int32_t option) 
 }
 
 std::string OrderUpdateOptionText(const OrderOptions& options, int32_t option) {
-  if (option == ouoUpdateSupport) return std::to_string(options.UpdateSupport);
-  std::string out;
-  BitText(options.UpdateFlags, option, {kUpdateUseDateTimeKey, kUpdateUseDateTimeFraction}, out);
-  return out;
+  return UpdateOptionText(options.UpdateFlags, options.UpdateSupport, option, ouoUpdateSupport);
 }
 
 std::string SeparatorText(std::u16string_view separators) {

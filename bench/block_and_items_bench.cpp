@@ -8,8 +8,8 @@
 #include <string>
 #include <vector>
 
-#include "shared/block.h"
-#include "shared/items.h"
+#include "format/block.h"
+#include "format/items.h"
 
 namespace {
 

@@ -36,14 +36,14 @@
 #include <thread>
 #include <vector>
 
-#include "build/findex_writer.h"
-#include "build/word_sort.h"
+#include "index/findex_writer.h"
+#include "index/word_sort.h"
 #include "platform/text_encoding.h"
 #include "quillmere/api_command.h"
-#include "shared/exception.h"
-#include "shared/global_defs.h"
-#include "shared/index_header.h"
-#include "shared/mfile.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
+#include "format/index_header.h"
+#include "format/mfile.h"
 
 namespace {
 

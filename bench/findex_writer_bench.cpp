@@ -8,8 +8,8 @@
 #include <string>
 #include <vector>
 
-#include "build/findex_files_writer.h"
-#include "shared/mfile.h"
+#include "index/findex_files_writer.h"
+#include "format/mfile.h"
 
 namespace {
 

@@ -29,8 +29,8 @@
 #include <string>
 #include <vector>
 
-#include "shared/exception.h"
-#include "shared/global_defs.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
 #include "sources/share_database.h"
 
 namespace {

@@ -25,10 +25,10 @@
 #include <string>
 #include <thread>
 
-#include "build/pi_order.h"
-#include "shared/exception.h"
-#include "shared/global_defs.h"
-#include "shared/order_info.h"
+#include "index/pi_order.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
+#include "format/order_info.h"
 #include "sources/share_database.h"
 
 namespace {

@@ -25,13 +25,13 @@
 #include <thread>
 #include <vector>
 
-#include "build/sort_entry.h"
-#include "build/word_sort.h"
-#include "shared/column_set.h"
-#include "shared/exception.h"
-#include "shared/global_defs.h"
-#include "shared/index_header.h"
-#include "shared/mfile.h"
+#include "format/sort_entry.h"
+#include "index/word_sort.h"
+#include "format/column_set.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
+#include "format/index_header.h"
+#include "format/mfile.h"
 
 namespace {
 

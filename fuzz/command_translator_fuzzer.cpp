@@ -5,12 +5,12 @@
 #include <string>
 #include <string_view>
 
-#include "build/command_translator.h"
-#include "build/findex_column_parser.h"
-#include "build/order_column_parser.h"
-#include "build/statement_mask.h"
+#include "command/command_translator.h"
+#include "command/findex_column_parser.h"
+#include "command/order_column_parser.h"
+#include "command/statement_mask.h"
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, std::size_t size) {
   using namespace qm;

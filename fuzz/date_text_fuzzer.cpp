@@ -4,8 +4,8 @@
 #include <string_view>
 
 #include "fuzz_check.h"
-#include "shared/exception_family.h"
-#include "shared/value.h"
+#include "base/exception_family.h"
+#include "base/value.h"
 
 using qm::fuzz::Require;
 

@@ -4,7 +4,7 @@
 #include <string>
 
 #include "fuzz_check.h"
-#include "shared/error_messages.h"
+#include "base/error_messages.h"
 
 using qm::fuzz::Require;
 

@@ -7,7 +7,7 @@
 
 #include "fuzz_check.h"
 #include "platform/text_encoding.h"
-#include "shared/message_format.h"
+#include "base/message_format.h"
 
 using qm::fuzz::Require;
 

@@ -5,8 +5,8 @@
 #include <string>
 
 #include "fuzz_check.h"
-#include "shared/exception_family.h"
-#include "shared/tokenizer.h"
+#include "base/exception_family.h"
+#include "base/tokenizer.h"
 
 using qm::fuzz::Require;
 

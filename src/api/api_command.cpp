@@ -3,10 +3,10 @@
 #include "api/api_arguments.h"
 #include "api/component_load.h"
 #include "api/error_report.h"
-#include "build/pi_start_point.h"
+#include "command/pi_start_point.h"
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/global_defs.h"
+#include "base/exception_family.h"
+#include "config/global_defs.h"
 
 namespace qm {
 

@@ -2,7 +2,7 @@
 
 #include <mutex>
 
-#include "shared/error_messages.h"
+#include "base/error_messages.h"
 
 namespace qm {
 

@@ -1,7 +1,7 @@
 #include "api/error_report.h"
 
-#include "shared/exception.h"
-#include "shared/trace.h"
+#include "base/exception.h"
+#include "base/trace.h"
 
 namespace qm {
 

@@ -6,7 +6,7 @@
 
 #include "platform/named_lock.h"
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 
 namespace qm {
 

@@ -5,8 +5,8 @@
 #include <limits>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/sql_time.h"
+#include "base/exception_family.h"
+#include "base/sql_time.h"
 
 namespace qm {
 

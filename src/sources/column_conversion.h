@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-#include "shared/value.h"
+#include "base/value.h"
 
 namespace qm {
 

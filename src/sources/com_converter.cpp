@@ -5,9 +5,9 @@
 #include "platform/file_io.h"
 #include "platform/shared_library.h"
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/global_defs.h"
-#include "shared/trace.h"
+#include "base/exception_family.h"
+#include "config/global_defs.h"
+#include "base/trace.h"
 #include "sources/document_encoding.h"
 
 namespace qm {

@@ -11,8 +11,8 @@
 
 #include "platform/config_store.h"
 #include "platform/file_io.h"
-#include "shared/exception_family.h"
-#include "shared/trace.h"
+#include "base/exception_family.h"
+#include "base/trace.h"
 
 namespace qm {
 

@@ -10,7 +10,7 @@
 #include <memory>
 #include <string>
 
-#include "shared/value.h"
+#include "base/value.h"
 
 namespace qm {
 

@@ -4,11 +4,11 @@
 #include <system_error>
 
 #include "platform/file_io.h"
-#include "shared/converter_runner.h"
-#include "shared/exception_family.h"
-#include "shared/file_operations.h"
-#include "shared/global_defs.h"
-#include "shared/temp_names.h"
+#include "config/converter_runner.h"
+#include "base/exception_family.h"
+#include "config/file_operations.h"
+#include "config/global_defs.h"
+#include "config/temp_names.h"
 #include "sources/document_encoding.h"
 
 namespace qm {

@@ -3,11 +3,11 @@
 #include <filesystem>
 #include <system_error>
 
-#include "shared/exception_family.h"
-#include "shared/file_operations.h"
-#include "shared/global_defs.h"
-#include "shared/temp_names.h"
-#include "shared/trace.h"
+#include "base/exception_family.h"
+#include "config/file_operations.h"
+#include "config/global_defs.h"
+#include "config/temp_names.h"
+#include "base/trace.h"
 #include "sources/connection.h"
 #include "sources/doc_converter.h"
 

@@ -1,7 +1,7 @@
 #include "sources/html_converter.h"
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 
 namespace qm {
 

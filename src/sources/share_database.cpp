@@ -12,12 +12,12 @@
 #include <new>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/file_operations.h"
-#include "shared/global_defs.h"
-#include "shared/mfile.h"
-#include "shared/temp_names.h"
-#include "shared/trace.h"
+#include "base/exception_family.h"
+#include "config/file_operations.h"
+#include "config/global_defs.h"
+#include "format/mfile.h"
+#include "config/temp_names.h"
+#include "base/trace.h"
 #include "sources/column_conversion.h"
 #include "sources/column_text.h"
 

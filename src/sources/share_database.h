@@ -18,7 +18,7 @@
 #include <string_view>
 #include <vector>
 
-#include "shared/value.h"
+#include "base/value.h"
 #include "sources/odbc_handle.h"
 
 namespace qm {

@@ -1,6 +1,6 @@
 #include "text/blank_trim.h"
 
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 #include "text/separators.h"
 
 namespace qm {

@@ -3,8 +3,8 @@
 #include <array>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/global_defs.h"
+#include "base/exception_family.h"
+#include "config/global_defs.h"
 #include "text/double_metaphone.h"
 #include "text/language_file.h"
 

@@ -1,6 +1,6 @@
 #include "text/language_file.h"
 
-#include "shared/win_file.h"
+#include "config/win_file.h"
 
 namespace qm::text {
 

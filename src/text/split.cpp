@@ -1,6 +1,6 @@
 #include "text/split.h"
 
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 
 namespace qm {
 

@@ -1,7 +1,7 @@
 #include "text/word_pipeline.h"
 
-#include "shared/global_defs.h"
-#include "shared/index_header.h"
+#include "config/global_defs.h"
+#include "format/index_header.h"
 #include "text/separators.h"
 
 namespace qm {

@@ -13,7 +13,7 @@
 
 #include "platform/text_encoding.h"
 #include "quillmere/api_command.h"
-#include "shared/global_defs.h"
+#include "config/global_defs.h"
 #include "sources/share_database.h"
 #include "support/test_support.h"
 

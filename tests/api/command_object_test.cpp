@@ -7,7 +7,7 @@
 #include <thread>
 
 #include "api/command_fixture.h"
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 
 namespace qm {
 namespace {

@@ -24,9 +24,9 @@
 #include <thread>
 #include <vector>
 
-#include "build/deleted_keys.h"
-#include "shared/exception.h"
-#include "shared/global_defs.h"
+#include "index/deleted_keys.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
 
 namespace {
 

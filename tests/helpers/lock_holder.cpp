@@ -12,7 +12,7 @@
 
 #include "locks/lock_manager.h"
 #include "platform/text_encoding.h"
-#include "shared/exception.h"
+#include "base/exception.h"
 
 int main(int argc, char** argv) {
   if (argc != 4) {

@@ -8,8 +8,8 @@
 #include <iostream>
 #include <string>
 
-#include "shared/exception.h"
-#include "shared/global_defs.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
 
 int main(int argc, char** argv) {
   if (argc != 5) {

@@ -17,7 +17,7 @@
 #include <vector>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 #include "support/test_support.h"
 
 namespace qm {

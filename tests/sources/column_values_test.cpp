@@ -7,8 +7,8 @@
 #include <string>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/sql_time.h"
+#include "base/exception_family.h"
+#include "base/sql_time.h"
 #include "sources/column_conversion.h"
 #include "sources/column_text.h"
 

@@ -10,7 +10,7 @@
 #include <ctime>
 #include <filesystem>
 
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 #include "sources/connection.h"
 #include "sources/doc_converter.h"
 #include "sources/document_text.h"

@@ -5,8 +5,8 @@
 #include <filesystem>
 #include <string>
 
-#include "shared/exception.h"
-#include "shared/global_defs.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
 #include "support/test_support.h"
 
 namespace qm::test {

@@ -7,9 +7,9 @@
 #include <filesystem>
 #include <fstream>
 
-#include "shared/converter_runner.h"
-#include "shared/exception_family.h"
-#include "shared/retry_pause.h"
+#include "config/converter_runner.h"
+#include "base/exception_family.h"
+#include "config/retry_pause.h"
 #include "sources/converter_table.h"
 #include "sources/doc_converter.h"
 #include "sources/document_text.h"

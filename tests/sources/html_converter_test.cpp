@@ -5,7 +5,7 @@
 #include <random>
 #include <string>
 
-#include "shared/exception_family.h"
+#include "base/exception_family.h"
 #include "sources/html_converter.h"
 
 namespace qm {

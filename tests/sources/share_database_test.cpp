@@ -10,8 +10,8 @@
 #include <filesystem>
 #include <string>
 
-#include "shared/exception_family.h"
-#include "shared/global_defs.h"
+#include "base/exception_family.h"
+#include "config/global_defs.h"
 #include "support/test_support.h"
 
 namespace qm {

@@ -4,7 +4,7 @@
 
 #include <sstream>
 
-#include "shared/exception.h"
+#include "base/exception.h"
 
 namespace qm::test {
 

@@ -7,8 +7,8 @@
 #include <string>
 
 #include "platform/text_encoding.h"
-#include "shared/exception_family.h"
-#include "shared/file_test_util.h"
+#include "base/exception_family.h"
+#include "support/file_test_util.h"
 #include "text/blank_trim.h"
 #include "text/next_word.h"
 #include "text/separators.h"

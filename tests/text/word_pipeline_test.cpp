@@ -8,8 +8,8 @@
 #include <vector>
 
 #include "platform/text_encoding.h"
-#include "shared/global_defs.h"
-#include "shared/index_header.h"
+#include "config/global_defs.h"
+#include "format/index_header.h"
 #include "text/language.h"
 #include "text/language_test_support.h"
 #include "text/word_pipeline.h"

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "shared/global_defs.h"
+#include "config/global_defs.h"
 #include "sources/share_database.h"
 #include "support/test_support.h"
 

@@ -11,9 +11,9 @@
 
 #include "command_registry.h"
 #include "platform/file_io.h"
-#include "shared/exception.h"
-#include "shared/global_defs.h"
-#include "shared/shipped_data.h"
+#include "base/exception.h"
+#include "config/global_defs.h"
+#include "base/shipped_data.h"
 #include "terminal_text.h"
 
 namespace qm::cli {

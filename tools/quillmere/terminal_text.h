@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "shared/exception.h"
+#include "base/exception.h"
 
 namespace qm::cli {
 

@@ -4,12 +4,12 @@
 #include <string>
 #include <vector>
 
-#include "build/command_locks.h"
-#include "build/command_translator.h"
-#include "build/statement_mask.h"
+#include "command/command_locks.h"
+#include "command/command_translator.h"
+#include "command/statement_mask.h"
 #include "command_registry.h"
 #include "platform/text_encoding.h"
-#include "shared/exception.h"
+#include "base/exception.h"
 #include "terminal_text.h"
 
 namespace qm::cli {

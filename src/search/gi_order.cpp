@@ -6,6 +6,7 @@
 #include "base/plain_name.h"
 #include "config/global_defs.h"
 #include "format/items.h"
+#include "format/order_column_file.h"
 #include "format/order_layout.h"
 #include "index/order_file_set.h"
 #include "locks/lock_manager.h"
@@ -93,6 +94,21 @@ void CGiOrder::ReadRows(CItems& rows) {
     bool sound = srt_.FileSize(false) == 4 + int64_t{rows.Count()} * 4 * width;
     for (int32_t i = 1; sound && i < rows.Count(); ++i) sound = rows.Key(i - 1) < rows.Key(i);
     if (!sound) throw CGiOrderException::Text("Order file is damaged: %s", kMethod, nullptr, srt_path_);
+  });
+}
+
+std::vector<std::vector<uint8_t>> CGiOrder::ReadColumnValues(const OrderColumn& column) {
+  constexpr const char* kMethod = "ReadColumnValues";
+  return GuardOrder(kMethod, [&] {
+    if (!open_) throw CGiOrderException::Text("Order is not open", kMethod, nullptr);
+    MFile file;
+    file.OpenFile(order_files::ColumnFilePath(defs_, name_, column.Name), MFile::kReadOnly);
+    OrderColumnReader reader(file, OrderColumnLayout::Of(column).type);
+    std::vector<std::vector<uint8_t>> values;
+    std::vector<uint8_t> value;
+    std::vector<int32_t> keys;
+    while (reader.Next(value, keys)) values.push_back(value);
+    return values;
   });
 }
 

@@ -7,6 +7,7 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "format/bfile.h"
 #include "format/mfile.h"
@@ -50,6 +51,8 @@ class CGiOrder {
   // "Order file is damaged: %s" when the .srt does not hold whole rows of the
   // width the info describes, one per key in ascending order.
   void ReadRows(CItems& rows);
+  // The encoded values of a type 2 order's column, by rank (its column file).
+  std::vector<std::vector<uint8_t>> ReadColumnValues(const OrderColumn& column);
 
  private:
   const CGlobalDefs& defs_;

@@ -18,6 +18,10 @@ struct AttachedColumn {
   bool ranks = false;    // a text order's column: the rows hold ranks, not values
   int32_t first = 0;     // the row column of its first value slot
   int32_t slots = 1;     // value slots, each one sort key
+  // A number or date/time column of a text order: its values by rank, as
+  // callers read them (attached_value.h).
+  std::vector<int32_t> rank_values;
+  std::vector<std::string> rank_texts;
 };
 
 class COrderColumnRegistry {

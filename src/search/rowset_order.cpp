@@ -190,6 +190,11 @@ const AttachedColumn& CGiRowsetOrder::AttachOrder(CItems& rows, std::string_view
     const std::string column = wanted.substr(dot + 1);
     RequirePlainName<CGiTreeRowsetException>("order", order, kMethod);
 
+    // Rows of another width are not the rows the orders were attached to.
+    if (!attached_.empty() && rows.Width() != attached_width_) {
+      attached_.clear();
+      registry_.Clear();
+    }
     if (attached_.contains(order)) {
       if (const AttachedColumn* known = registry_.Find(wanted)) return *known;
       throw CGiTreeRowsetException::Text("Column %S is not prepared for order", kMethod, nullptr,
@@ -215,8 +220,10 @@ const AttachedColumn& CGiRowsetOrder::AttachOrder(CItems& rows, std::string_view
     std::vector<AttachedColumn> added;
     for (const OrderColumn& c : info.Columns) {
       const OrderColumnLayout layout = OrderColumnLayout::Of(c);
-      added.push_back({order + "." + ToUpper(c.Name), layout.type, ranks,
-                       base + layout.first - 1, layout.slots});
+      AttachedColumn attached{order + "." + ToUpper(c.Name), layout.type, ranks,
+                              base + layout.first - 1, layout.slots, {}, {}};
+      if (ranks && !IsTextType(layout.type)) TakeRankValues(attached, file->ReadColumnValues(c));
+      added.push_back(std::move(attached));
     }
     const int32_t extra = StoredRowWidth(info) - 1;
     if (extra < 1 || rows.Columns().b + extra > 0xFFFF) {
@@ -257,6 +264,7 @@ const AttachedColumn& CGiRowsetOrder::AttachOrder(CItems& rows, std::string_view
     rows = std::move(widened);
     for (AttachedColumn& c : added) registry_.Register(std::move(c));
     attached_.emplace(order, std::move(file));
+    attached_width_ = rows.Width();
     DropGroups();
     return *registry_.Find(wanted);
   });
@@ -272,6 +280,7 @@ void CGiRowsetOrder::SortItems(CItems& rows, const RowsetOrderContext& context) 
     }
     const int32_t n = ResultRows(rows);
     const auto width = static_cast<std::size_t>(rows.Width());
+    RequireSortColumns(rows, "SortItems");
     if (n >= 2) {
       int32_t* data = rows.Row(kFirstRow);
       std::vector<int32_t> buffer(static_cast<std::size_t>(n) * width);
@@ -318,6 +327,15 @@ void CGiRowsetOrder::KeepMaxScore(const CItems& rows, const RowsetOrderContext& 
   max_score_ = static_cast<int32_t>(std::clamp<int64_t>(floor, max_score_, INT32_MAX));
 }
 
+void CGiRowsetOrder::RequireSortColumns(const CItems& rows, const char* method) const {
+  for (const SortColumn& key : sort_keys_) {
+    if (key.column >= rows.Width()) {
+      throw CGiTreeRowsetException::Text("The rows lack sort column %i: order them anew", method,
+                                         nullptr, key.column);
+    }
+  }
+}
+
 void CGiRowsetOrder::ReverseItems(CItems& rows) {
   GuardRowset("ReverseItems", [&] {
     DropGroups();
@@ -333,6 +351,7 @@ void CGiRowsetOrder::ReverseItems(CItems& rows) {
 void CGiRowsetOrder::CollectItems(const CItems& rows) {
   GuardRowset("CollectItems", [&] {
     DropGroups();
+    RequireSortColumns(rows, "CollectItems");
     const int32_t n = ResultRows(rows);
     const std::size_t levels = sort_keys_.size();
     std::vector<int32_t> running(levels, 1);

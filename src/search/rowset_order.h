@@ -139,6 +139,8 @@ class CGiRowsetOrder {
   void RequireScores(const CItems& rows, const RowsetOrderContext& context, const char* method,
                      const char* text) const;
   void DropGroups();
+  // Sort keys that point past the rows (rows replaced after ordering) raise.
+  void RequireSortColumns(const CItems& rows, const char* method) const;
   // Every score seen, and at least 200 per condition part when there are rows.
   void KeepMaxScore(const CItems& rows, const RowsetOrderContext& context);
 
@@ -154,6 +156,7 @@ class CGiRowsetOrder {
 
   COrderColumnRegistry registry_;
   std::map<std::string, std::unique_ptr<CGiOrder>> attached_;  // by upper-case requested name
+  int32_t attached_width_ = 0;  // the width of the rows they were attached to
 
   // Groups: the last row of each group, and per group and sort level the
   // rows of the run that closes there (0 where no run of that level closes).

@@ -69,6 +69,28 @@ int32_t ClampScore(double score) {
   return static_cast<int32_t>(std::trunc(score));
 }
 
+// The header's column layouts place every value inside the stored rows, one
+// after the other, in the slots its type takes; a damaged header must not
+// make the attach read outside them.
+void RequireSoundLayout(const COrderInfo& info, const std::string& name) {
+  const bool ranks = info.OrderType == kOrderTypeRanks;
+  bool sound = (ranks || info.OrderType == kOrderTypeValues) && !info.Columns.empty();
+  int32_t next = 1;
+  for (const OrderColumn& c : info.Columns) {
+    if (!sound) break;
+    const OrderColumnLayout layout = OrderColumnLayout::Of(c);
+    const auto code = static_cast<int32_t>(layout.type);
+    const bool known = code == 1 || code == 2 || code == 3 || code == 4 || code == 6;
+    sound = known && layout.first == next &&
+            layout.slots == (ranks ? 1 : ValueSlots(layout.type)) && (ranks || !IsTextType(layout.type));
+    next += layout.slots;
+  }
+  if (!sound) {
+    throw CGiOrderException::Text("Order %s is damaged: its header does not describe its rows",
+                                  "AttachOrder", nullptr, name);
+  }
+}
+
 }  // namespace
 
 CGiRowsetOrder::CGiRowsetOrder(const CGlobalDefs& defs) : defs_(defs) {}
@@ -124,11 +146,10 @@ void CGiRowsetOrder::SetOrder(CItems& rows, std::string_view list, bool add_orde
       return;
     }
 
-    sort_keys_.clear();
-    sql_order_.clear();
-    score_active_ = false;
-    reverse_ = false;
-    DropGroups();
+    // Built aside: a list that fails leaves the order as it was.
+    std::vector<SortColumn> keys;
+    std::string sql;
+    bool score_active = false;
     std::string_view rest = upper;
     while (!rest.empty()) {
       const auto comma = rest.find(',');
@@ -153,12 +174,12 @@ void CGiRowsetOrder::SetOrder(CItems& rows, std::string_view list, bool add_orde
         if (!context.score_support || !CarriesScores(rows)) {
           throw CGiTreeRowsetException::Numbered(kNoScoreSupport, kMethod, nullptr);
         }
-        sort_keys_.push_back({kScoreColumn, descending});
-        sql_order_ += std::string("SCORE") + written;
-        score_active_ = true;
+        keys.push_back({kScoreColumn, descending});
+        sql += std::string("SCORE") + written;
+        score_active = true;
       } else if (column == "KEY") {
-        sort_keys_.push_back({0, descending});
-        sql_order_ += context.key_column + written;
+        keys.push_back({0, descending});
+        sql += context.key_column + written;
       } else {
         const AttachedColumn* attached = nullptr;
         try {
@@ -167,13 +188,18 @@ void CGiRowsetOrder::SetOrder(CItems& rows, std::string_view list, bool add_orde
           throw CGiTreeRowsetException::Numbered(kNoOrderColumn, kMethod, &e);
         }
         for (int32_t i = 0; i < attached->slots; ++i) {
-          sort_keys_.push_back({attached->first + i, descending});
+          keys.push_back({attached->first + i, descending});
         }
-        sql_order_ += std::string(column) + written;
+        sql += std::string(column) + written;
       }
     }
-    if (!sql_order_.empty()) sql_order_.pop_back();
+    if (!sql.empty()) sql.pop_back();
+    sort_keys_ = std::move(keys);
+    sql_order_ = std::move(sql);
+    score_active_ = score_active;
+    reverse_ = false;
     add_order_clause_ = add_order_clause;
+    DropGroups();
   });
 }
 
@@ -212,11 +238,17 @@ const AttachedColumn& CGiRowsetOrder::AttachOrder(CItems& rows, std::string_view
                                          column);
     }
 
+    const COrderInfo& info = file->Info();
+    RequireSoundLayout(info, name);
     CItems stored(1);
     file->ReadRows(stored);
-    const COrderInfo& info = file->Info();
     const bool ranks = info.OrderType == kOrderTypeRanks;
     const int32_t base = rows.Width();
+    const int32_t extra = StoredRowWidth(info) - 1;
+    if (rows.Columns().b + extra > 0xFFFF) {
+      throw CGiTreeRowsetException::Text("Order %s cannot be attached: the rows would be too wide",
+                                         kMethod, nullptr, name);
+    }
     std::vector<AttachedColumn> added;
     for (const OrderColumn& c : info.Columns) {
       const OrderColumnLayout layout = OrderColumnLayout::Of(c);
@@ -224,11 +256,6 @@ const AttachedColumn& CGiRowsetOrder::AttachOrder(CItems& rows, std::string_view
                               base + layout.first - 1, layout.slots, {}, {}};
       if (ranks && !IsTextType(layout.type)) TakeRankValues(attached, file->ReadColumnValues(c));
       added.push_back(std::move(attached));
-    }
-    const int32_t extra = StoredRowWidth(info) - 1;
-    if (extra < 1 || rows.Columns().b + extra > 0xFFFF) {
-      throw CGiTreeRowsetException::Text("Order %s cannot be attached: %i value columns", kMethod,
-                                         nullptr, name, extra);
     }
 
     // The rows widened by the order's columns; a key the order lacks gets NULLs.

@@ -12,7 +12,9 @@
 #include "api/command_fixture.h"
 #include "base/error_messages.h"
 #include "base/exception_family.h"
+#include "format/bfile.h"
 #include "format/items.h"
+#include "format/order_info.h"
 #include "locks/lock_manager.h"
 #include "search/rowset_order.h"
 
@@ -183,6 +185,18 @@ TEST_F(AttachedOrderTest, GroupsReadValuesCountsGroupStringsAndGroupSql) {
 
 TEST_F(AttachedOrderTest, OrderColumnsThatCannotBeAttachedRaiseError61WithTheCause) {
   fs::resize_file(OrderFolder() + "TITLES.srt", 10);
+  // A header whose second column claims slots past the first's.
+  ASSERT_EQ(Run("CREATE ORDER Bent ON TABLE items COLUMNS n, r KEY id"), "");
+  {
+    COrderInfo info;
+    BFile sri;
+    sri.OpenFile(OrderFolder() + "BENT.sri", BFile::kReadOnly, 64);
+    info.ReadInfo(sri);
+    sri.Close();
+    info.Columns[1].BuilderValues[1] = 7;
+    sri.OpenFile(OrderFolder() + "BENT.sri", BFile::kCreate, 64);
+    info.WriteInfo(sri);
+  }
   struct Case {
     const char* list;
     const char* cause;
@@ -192,6 +206,7 @@ TEST_F(AttachedOrderTest, OrderColumnsThatCannotBeAttachedRaiseError61WithTheCau
       {"NOSUCH.N", "NOSUCH.sri"},
       {"../ITEMS.N DESC", "Invalid order name"},
       {"TITLES.TITLE", "Order file is damaged"},
+      {"BENT.N", "Order BENT is damaged: its header does not describe its rows"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.list);

@@ -137,11 +137,18 @@ TEST_F(ResultOrderTest, FaultyOrderListsRaiseTheirNumberedErrors) {
   for (const Case& c : cases) {
     SCOPED_TRACE(c.list);
     CItems rows = Rows(kScored);
+    context_.score_support = true;
+    order_.SetOrder(rows, "KEY DESC", false, context_);
     context_.score_support = c.score_support;
     const test::Raise raised = Raised<CGiTreeRowsetException>(
-        [&] { order_.SetOrder(rows, c.list, true, context_); });
+        [&] { order_.SetOrder(rows, std::string("KEY, ") + c.list, true, context_); });
     EXPECT_EQ(raised.number, c.number);
     EXPECT_EQ(raised.text, c.text);
+    // A list that fails leaves the order as it was.
+    EXPECT_EQ(order_.SqlOrderString(), "Id DESC");
+    EXPECT_FALSE(order_.AddOrderClause());
+    order_.SortItems(rows, context_);
+    EXPECT_EQ(Column(rows, 0), (Ints{5, 4, 3, 2, 1}));
   }
 }
 

@@ -61,6 +61,89 @@ int CompareRows(const int32_t* a, const int32_t* b, const std::vector<SortColumn
   return 0;
 }
 
+// Bottom-up merge sort of n rows of width integers: runs of 1, 2, 4, ...
+// rows merged pairwise through a second buffer; on a tie the second run's
+// row goes first.
+void MergeSort(int32_t* data, int32_t n, std::size_t width, const std::vector<SortColumn>& keys) {
+  std::vector<int32_t> buffer(static_cast<std::size_t>(n) * width);
+  int32_t* from = data;
+  int32_t* to = buffer.data();
+  for (int64_t run = 1; run < n; run *= 2) {
+    for (int64_t lo = 0; lo < n; lo += 2 * run) {
+      const int64_t mid = std::min<int64_t>(lo + run, n);
+      const int64_t hi = std::min<int64_t>(lo + 2 * run, n);
+      int64_t a = lo;
+      int64_t b = mid;
+      int32_t* out = to + lo * width;
+      while (a < mid && b < hi) {
+        const int32_t* left = from + a * width;
+        const int32_t* right = from + b * width;
+        if (CompareRows(left, right, keys) < 0) {
+          out = std::copy_n(left, width, out);
+          ++a;
+        } else {
+          out = std::copy_n(right, width, out);
+          ++b;
+        }
+      }
+      out = std::copy(from + a * width, from + mid * width, out);
+      std::copy(from + b * width, from + hi * width, out);
+    }
+    std::swap(from, to);
+  }
+  if (from != data) std::copy_n(from, static_cast<std::size_t>(n) * width, data);
+}
+
+// The same order for one or two sort keys, faster: that merge puts rows of
+// equal sort values in the reverse of their order before the sort, so the
+// rows sort by their sort values packed into 64 bits, then by their
+// position from the end.
+void PackedSort(int32_t* data, int32_t n, std::size_t width, const std::vector<SortColumn>& keys) {
+  struct Entry {
+    uint64_t values;
+    uint32_t from_end;
+    bool operator<(const Entry& o) const {
+      return values != o.values ? values < o.values : from_end < o.from_end;
+    }
+  };
+  // Signed order as unsigned order; a descending key inverted.
+  const auto packed = [](const SortColumn& key, const int32_t* row) -> uint64_t {
+    const uint32_t v = static_cast<uint32_t>(row[key.column]) ^ 0x80000000u;
+    return key.descending ? uint32_t{~v} : v;
+  };
+  std::vector<int32_t> sorted(static_cast<std::size_t>(n) * width);
+  int32_t* out = sorted.data();
+  if (keys.size() == 1) {
+    // One key: the value and the position from the end in one integer.
+    std::vector<uint64_t> packed_rows(static_cast<std::size_t>(n));
+    for (int32_t i = 0; i < n; ++i) {
+      packed_rows[static_cast<std::size_t>(i)] =
+          (packed(keys[0], data + static_cast<std::size_t>(i) * width) << 32) |
+          static_cast<uint32_t>(n - 1 - i);
+    }
+    std::sort(packed_rows.begin(), packed_rows.end());
+    for (const uint64_t p : packed_rows) {
+      const auto from = static_cast<std::size_t>(n - 1) - static_cast<uint32_t>(p);
+      out = std::copy_n(data + from * width, width, out);
+    }
+    std::copy(sorted.begin(), sorted.end(), data);
+    return;
+  }
+  std::vector<Entry> entries(static_cast<std::size_t>(n));
+  for (int32_t i = 0; i < n; ++i) {
+    const int32_t* row = data + static_cast<std::size_t>(i) * width;
+    uint64_t values = 0;
+    for (const SortColumn& key : keys) values = (values << 32) | (packed(key, row) & 0xFFFFFFFFu);
+    entries[static_cast<std::size_t>(i)] = {values, static_cast<uint32_t>(n - 1 - i)};
+  }
+  std::sort(entries.begin(), entries.end());
+  for (const Entry& e : entries) {
+    const auto from = static_cast<std::size_t>(n - 1) - e.from_end;
+    out = std::copy_n(data + from * width, width, out);
+  }
+  std::copy(sorted.begin(), sorted.end(), data);
+}
+
 int32_t ClampScore(double score) {
   if (std::isnan(score) || score <= 0) return 0;
   if (score >= static_cast<double>(std::numeric_limits<int32_t>::max())) {
@@ -309,35 +392,11 @@ void CGiRowsetOrder::SortItems(CItems& rows, const RowsetOrderContext& context) 
     const auto width = static_cast<std::size_t>(rows.Width());
     RequireSortColumns(rows, "SortItems");
     if (n >= 2) {
-      int32_t* data = rows.Row(kFirstRow);
-      std::vector<int32_t> buffer(static_cast<std::size_t>(n) * width);
-      int32_t* from = data;
-      int32_t* to = buffer.data();
-      for (int64_t run = 1; run < n; run *= 2) {
-        for (int64_t lo = 0; lo < n; lo += 2 * run) {
-          const int64_t mid = std::min<int64_t>(lo + run, n);
-          const int64_t hi = std::min<int64_t>(lo + 2 * run, n);
-          int64_t a = lo;
-          int64_t b = mid;
-          int32_t* out = to + lo * width;
-          while (a < mid && b < hi) {
-            const int32_t* left = from + a * width;
-            const int32_t* right = from + b * width;
-            // On a tie the second run's row goes first.
-            if (CompareRows(left, right, sort_keys_) < 0) {
-              out = std::copy_n(left, width, out);
-              ++a;
-            } else {
-              out = std::copy_n(right, width, out);
-              ++b;
-            }
-          }
-          out = std::copy(from + a * width, from + mid * width, out);
-          std::copy(from + b * width, from + hi * width, out);
-        }
-        std::swap(from, to);
+      if (sort_keys_.size() <= 2) {
+        PackedSort(rows.Row(kFirstRow), n, width, sort_keys_);
+      } else {
+        MergeSort(rows.Row(kFirstRow), n, width, sort_keys_);
       }
-      if (from != data) std::copy_n(from, static_cast<std::size_t>(n) * width, data);
     }
     KeepMaxScore(rows, context);
   });

@@ -3,6 +3,7 @@
 // maximum score, rounding and adjusting scores, and reading groups.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <utility>
 #include <vector>
@@ -99,6 +100,30 @@ TEST_F(ResultOrderTest, OrderListsSortBySortKeysAndWriteTheSqlOrderString) {
     EXPECT_EQ(order_.SqlOrderString(), c.sql);
     EXPECT_EQ(order_.ScoreActive(), c.score_active);
     EXPECT_EQ(rows.Row(0)[0], 6) << "the count row stays first";
+  }
+}
+
+TEST_F(ResultOrderTest, ManyEqualScoresComeOutInTheReverseOfTheirOrderBeforeTheSort) {
+  // Rows of few distinct scores, not in key order, past the sizes of the
+  // cases above: the stable order of the reversed rows is the tie rule.
+  std::vector<std::pair<int32_t, int32_t>> input;
+  uint32_t seed = 12345;
+  for (int32_t key = 1; key <= 5000; ++key) {
+    seed = seed * 1103515245u + 12345u;
+    input.emplace_back(static_cast<int32_t>(seed >> 8) % 100000, static_cast<int32_t>(seed >> 20) % 7);
+  }
+  for (const char* list : {"SCORE", "SCORE ASC"}) {
+    SCOPED_TRACE(list);
+    CItems rows = Rows(input);
+    Order(rows, list);
+    std::vector<std::pair<int32_t, int32_t>> expected(input.rbegin(), input.rend());
+    const bool descending = std::string(list) == "SCORE";
+    std::stable_sort(expected.begin(), expected.end(), [&](const auto& a, const auto& b) {
+      return descending ? a.second > b.second : a.second < b.second;
+    });
+    Ints keys;
+    for (const auto& row : expected) keys.push_back(row.first);
+    EXPECT_EQ(Column(rows, 0), keys);
   }
 }
 

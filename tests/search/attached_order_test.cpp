@@ -185,6 +185,8 @@ TEST_F(AttachedOrderTest, GroupsReadValuesCountsGroupStringsAndGroupSql) {
 
 TEST_F(AttachedOrderTest, OrderColumnsThatCannotBeAttachedRaiseError61WithTheCause) {
   fs::resize_file(OrderFolder() + "TITLES.srt", 10);
+  test::WriteFile(OrderFolder() + "NOHEAD.sri", "not a header");
+  test::WriteFile(OrderFolder() + "NOHEAD.srt", std::string(4, '\0'));
   // A header whose second column claims slots past the first's.
   ASSERT_EQ(Run("CREATE ORDER Bent ON TABLE items COLUMNS n, r KEY id"), "");
   {
@@ -206,6 +208,7 @@ TEST_F(AttachedOrderTest, OrderColumnsThatCannotBeAttachedRaiseError61WithTheCau
       {"NOSUCH.N", "NOSUCH.sri"},
       {"../ITEMS.N DESC", "Invalid order name"},
       {"TITLES.TITLE", "Order file is damaged"},
+      {"NOHEAD.N", "Error reading order header"},
       {"BENT.N", "Order BENT is damaged: its header does not describe its rows"},
   };
   for (const Case& c : cases) {

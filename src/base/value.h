@@ -81,7 +81,6 @@ class CValue {
   int32_t GetInteger() const { return integer_; }
   double GetDouble() const { return double_; }
   const DateTimeValue& GetDateTime() const { return date_; }
-  DateTimeValue& DateTimeRef() { return date_; }
   std::size_t NarrowCapacity() const { return narrow_capacity_; }
   std::size_t WideCapacity() const { return wide_capacity_; }
 

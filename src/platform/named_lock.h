@@ -52,7 +52,6 @@ class NamedLock {
   // Takes one more reader unit (any unit this description does not hold yet),
   // polling until timeout.
   WaitResult LockUnit(std::chrono::milliseconds timeout);
-  int UnitsHeld() const { return static_cast<int>(units_.count()); }
   // Gives back every unit held, in one release.
   void UnlockUnits();
 

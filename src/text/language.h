@@ -76,8 +76,6 @@ class CLanguage {
   bool IsLoaded() const { return loaded_; }
   int32_t GetLanguage() const { return config_.language; }
   int32_t GetOptions() const;
-  int32_t GetPhoneticMode() const { return phonetic_mode_; }
-  const std::string& GetCharacterTableName() const { return table_name_; }
   const std::string& GetLanguageFolder() const { return folder_; }
 
  private:

@@ -34,11 +34,8 @@ class PhonetRules {
     Encode(word, word.size(), out, work);
   }
 
-  bool Followup() const { return followup_; }
-  bool CollapseResult() const { return collapse_result_; }
   // Read for completeness; accents are removed (or not) before the rules run.
   bool RemoveAccents() const { return remove_accents_; }
-  std::size_t RuleCount() const { return rules_.size(); }
 
  private:
   // Where a pattern must stand once its letters matched.

@@ -213,6 +213,11 @@ int32_t CountParts(const CGiNode* node) {
   }
 }
 
+// Whether a comparison operator stands outside phrases and parentheses.
+bool HasComparison(std::u16string_view text) {
+  return HideExpW(text).find_first_of(u"=<>") != std::u16string::npos;
+}
+
 bool IsAsciiUpperEqual(std::u16string_view token, std::u16string_view keyword) {
   if (token.size() != keyword.size()) return false;
   for (std::size_t i = 0; i < token.size(); ++i) {
@@ -242,8 +247,6 @@ std::vector<std::u16string_view> PlainTokens(std::u16string_view text) {
 
 }  // namespace
 
-CGiCmdTree::CGiCmdTree(const CGlobalDefs& defs) : defs_(&defs), facts_(CatalogueFacts(defs)) {}
-
 CGiCmdTree::CGiCmdTree(std::string language_folder, GiFindexFactsSource facts)
     : language_folder_(std::move(language_folder)), facts_(std::move(facts)) {}
 
@@ -266,7 +269,10 @@ void CGiCmdTree::SplitSqlW(std::u16string_view statement) {
     if (condition.empty()) {
       throw CGiCmdTreeException::Numbered(kErrorEmptyCondition, "SplitSqlW", nullptr);
     }
-    std::u16string tail = Cut(work, position, u'#');
+    // The tail is the rest of the statement: a "#" in it (a date literal)
+    // must not cut the host's SQL short.
+    std::u16string tail = position < work.size() ? work.substr(position, work.size() - 1 - position)
+                                                 : std::u16string();
     StartBuildTreeW(ToUpper(condition));
     head_ = std::move(head);
     tail_ = std::move(tail);
@@ -317,6 +323,11 @@ std::unique_ptr<CGiNode> CGiCmdTree::BuildNode(std::u16string_view text, bool va
   }
   const std::u16string inner = RemoveParenthesesW(TrimBlanks(text));
   GiSplit split = FindOperatorW(inner);
+  if (!value_mode && split.code != kGiOpNone && split.code != kGiOpNot &&
+      HasComparison(split.left) && !HasComparison(split.right)) {
+    // ID='5' OR '7': the operator joins values of one condition.
+    split.code = kGiOpNone;
+  }
   if (split.code == kGiOpNone) {
     if (value_mode) {
       std::u16string word = UndoubleQuotes(StripQuotes(TrimBlanks(inner)));

@@ -16,6 +16,7 @@ namespace qm {
 
 class CGlobalDefs;
 class CLanguage;
+class CSeparatorSet;
 
 class CGiCmdTree {
  public:
@@ -66,8 +67,11 @@ class CGiCmdTree {
 
  private:
   std::unique_ptr<CGiNode> BuildNode(std::u16string_view text, bool value_mode, int depth);
-  void FillCondition(CGiNode& node, std::u16string_view text, int depth);
-  std::u16string RemoveStopWords(std::u16string_view value, const GiFindexFacts& facts);
+  // Fills a condition node; true when a plain query replaced it by the tree
+  // in node.left.
+  bool FillCondition(CGiNode& node, std::u16string_view text, int depth);
+  std::u16string RemoveStopWords(std::u16string_view value, const CSeparatorSet& separators);
+  CLanguage& Language();
 
   std::u16string head_;
   std::u16string tail_;
@@ -77,6 +81,7 @@ class CGiCmdTree {
   bool score_column_ = false;
   int32_t part_count_ = 0;
   std::unique_ptr<CGiNode> root_;
+  const CGlobalDefs* defs_ = nullptr;  // not owned; null with an explicit folder
   std::string language_folder_;
   std::unique_ptr<CLanguage> language_;
   GiFindexFactsSource facts_;

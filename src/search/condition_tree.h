@@ -25,6 +25,7 @@ inline constexpr int32_t kGiOpNot = 3;
 inline constexpr int32_t kGiOpFilter = 4;
 inline constexpr int32_t kGiOpNone = 5;       // a leaf: no operator in the text
 inline constexpr int32_t kGiOpAdjacent = 6;   // the words of a phrase, in order
+inline constexpr int32_t kGiOpProximity = 7;  // what 1, 2, 6, 8, 11 merge as under "=|"
 inline constexpr int32_t kGiOpAndNot = 8;     // made by the NOT rewrite
 inline constexpr int32_t kGiOpFilterNot = 9;  // made by the NOT rewrite
 inline constexpr int32_t kGiOpNear = 11;
@@ -41,6 +42,9 @@ inline constexpr int32_t kGiCmpLess = 128;
 
 // NEAR without a written distance.
 inline constexpr int32_t kGiDefaultNearDistance = 10;
+// Deepest nesting of operators and parentheses a condition may have, so a
+// hostile statement cannot exhaust the stack of the parser or the evaluator.
+inline constexpr int kGiMaxConditionDepth = 400;
 // Longest word text and findex name, in UTF-16 units (a terminator would make 200).
 inline constexpr std::size_t kGiMaxNodeText = 199;
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
+#include <limits>
 #include <string_view>
 #include <utility>
 
@@ -62,13 +63,36 @@ Number ParseNumber(const std::u16string& word, const char* message) {
   if (!text.empty() && text.front() == '+') ++begin;
   const auto [stop, error] = std::from_chars(begin, end, value);
   if (text.empty() || error != std::errc() || stop != end) {
-    throw CGiTreeRowsetException::Text(message, "SearchNext");
+    throw CGiTreeRowsetException::Text(message, "SearchNext", nullptr);
   }
   return value;
 }
 
+// "*" on a findex of numbers or dates: every value (the left side that a
+// negation is taken from).
+CWordSearch EveryValue(VALUE_TYPE type) {
+  CValue low(type);
+  CValue high(type);
+  if (type == VALUE_TYPE::Integer) {
+    low.SetInteger(std::numeric_limits<int32_t>::min());
+    high.SetInteger(std::numeric_limits<int32_t>::max());
+  } else if (type == VALUE_TYPE::Double) {
+    low.SetDouble(std::numeric_limits<double>::lowest());
+    high.SetDouble(std::numeric_limits<double>::max());
+  } else {
+    low.SetDateFromText("0-1-1", false);
+    high.SetDateFromText("32767-12-31", true);
+  }
+  return CWordSearch::ForRange(low, high);
+}
+
 CWordSearch TypedSearch(const std::u16string& word, int32_t findex_type) {
-  switch (static_cast<VALUE_TYPE>(findex_type)) {
+  const auto type = static_cast<VALUE_TYPE>(findex_type);
+  if (word == u"*" &&
+      (type == VALUE_TYPE::Integer || type == VALUE_TYPE::Double || type == VALUE_TYPE::DateTime)) {
+    return EveryValue(type);
+  }
+  switch (type) {
     case VALUE_TYPE::Integer: {
       CValue value(VALUE_TYPE::Integer);
       value.SetInteger(ParseNumber<int32_t>(word, "Not a valid integer"));
@@ -122,7 +146,9 @@ void CGiTreeRowset::Close() {
 void CGiTreeRowset::SetLimits(int32_t start, int32_t count) {
   first_ = std::max(start, 1);
   count = std::max(count, 0);
-  num_ = first_ > total_ ? 0 : static_cast<int32_t>(std::min<int64_t>(count, int64_t{total_} - first_ + 1));
+  num_ = first_ > total_
+             ? 0
+             : static_cast<int32_t>(std::min<int64_t>(count, int64_t{total_} - first_ + 1));
 }
 
 int32_t CGiTreeRowset::LimitRows(const CColumnSet& columns) const {
@@ -133,9 +159,11 @@ int32_t CGiTreeRowset::LimitRows(const CColumnSet& columns) const {
 void CGiTreeRowset::StartRowset(int32_t command_number, bool append) {
   Guarded("StartRowset", [&] {
     const CGiCmdTree& command = commands_.Command(command_number);
-    if (!command.IsParsed()) throw CGiTreeRowsetException::Text("Command not parsed", "StartRowset");
+    if (!command.IsParsed())
+      throw CGiTreeRowsetException::Text("Command not parsed", "StartRowset", nullptr);
     if (!append || !open_) truncated_ = false;
     CItems items = Evaluate(command.Root(), Context{});
+    const int32_t found = ResultRows(items);
     if (commands_.first_header) sql_order_ = commands_.first_header->KeyColumn + " ASC";
 
     if (append && open_) {
@@ -153,8 +181,7 @@ void CGiTreeRowset::StartRowset(int32_t command_number, bool append) {
     first_ = 1;
     num_ = total_;
     open_ = true;
-    Trace(TraceLevel1.load(), TagOf("StartRowset"), "Total resulting items for search: %i",
-          ResultRows(items));
+    Trace(TraceLevel1.load(), TagOf("StartRowset"), "Total resulting items for search: %i", found);
   });
 }
 
@@ -166,7 +193,7 @@ CItems CGiTreeRowset::Evaluate(const CGiNode& node, const Context& context) {
       return SearchWord(node, context);
     case GiNodeKind::Operator: {
       if (node.left == nullptr || node.right == nullptr) {
-        throw CGiTreeRowsetException::Text("Operator without operands", "StartRowset");
+        throw CGiTreeRowsetException::Text("Operator without operands", "StartRowset", nullptr);
       }
       // NEAR between two conditions compares every occurrence of both
       // sides: a condition reduced to one row per key would keep only its
@@ -174,10 +201,10 @@ CItems CGiTreeRowset::Evaluate(const CGiNode& node, const Context& context) {
       const bool near_conditions = node.op == kGiOpNear &&
                                    node.left->kind == GiNodeKind::Condition &&
                                    node.right->kind == GiNodeKind::Condition;
-      CItems left = near_conditions ? EvaluateCondition(*node.left, false)
-                                    : Evaluate(*node.left, context);
-      CItems right = near_conditions ? EvaluateCondition(*node.right, false)
-                                     : Evaluate(*node.right, context);
+      CItems left =
+          near_conditions ? EvaluateCondition(*node.left, false) : Evaluate(*node.left, context);
+      CItems right =
+          near_conditions ? EvaluateCondition(*node.right, false) : Evaluate(*node.right, context);
       int32_t distance = 0;
       if (node.op == kGiOpAdjacent || node.op == 7) {
         distance = context.modifier;
@@ -194,11 +221,12 @@ CItems CGiTreeRowset::Evaluate(const CGiNode& node, const Context& context) {
     case GiNodeKind::Negation:
       break;
   }
-  throw CGiTreeRowsetException::Text("Negation left in the condition tree", "StartRowset");
+  throw CGiTreeRowsetException::Text("Negation left in the condition tree", "StartRowset", nullptr);
 }
 
 CItems CGiTreeRowset::EvaluateCondition(const CGiNode& node, bool reduce) {
-  if (node.left == nullptr) throw CGiTreeRowsetException::Text("Condition without value", "StartRowset");
+  if (node.left == nullptr)
+    throw CGiTreeRowsetException::Text("Condition without value", "StartRowset", nullptr);
   CGiRepository view(defs_);
   view.OpenRepository(Utf16ToUtf8(node.text));
   if (!commands_.first_header) commands_.first_header = view.Header();
@@ -213,10 +241,11 @@ CItems CGiTreeRowset::EvaluateCondition(const CGiNode& node, bool reduce) {
   return items;
 }
 
-std::u16string CGiTreeRowset::NormaliseWord(const std::u16string& word, const CIndexHeader& header) {
-  const int32_t steps = header.LanguageFlags & (CLanguage::kUseStemming | CLanguage::kUsePhonetic |
-                                                CLanguage::kRemoveAccents |
-                                                CLanguage::kUseCharacterTranslation);
+std::u16string CGiTreeRowset::NormaliseWord(const std::u16string& word,
+                                            const CIndexHeader& header) {
+  const int32_t steps =
+      header.LanguageFlags & (CLanguage::kUseStemming | CLanguage::kUsePhonetic |
+                              CLanguage::kRemoveAccents | CLanguage::kUseCharacterTranslation);
   // A pattern is matched against the stored words as written: a stem or a
   // phonetic code of "LIB*" is no pattern of the words it stands for.
   if (steps == 0 || word == u"*" || CWordPattern(word).HasWildcards()) return word;
@@ -226,7 +255,8 @@ std::u16string CGiTreeRowset::NormaliseWord(const std::u16string& word, const CI
 }
 
 CItems CGiTreeRowset::SearchWord(const CGiNode& node, const Context& context) {
-  if (context.view == nullptr) throw CGiTreeRowsetException::Text("Word outside a condition", "SearchNext");
+  if (context.view == nullptr)
+    throw CGiTreeRowsetException::Text("Word outside a condition", "SearchNext", nullptr);
   CGiRepository& view = *context.view;
   const CIndexHeader& header = view.Header();
   const CColumnSet columns = CColumnSet::FromGeneralFlags(header.GeneralFlags);

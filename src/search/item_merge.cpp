@@ -99,7 +99,8 @@ CItems MergeOr(const CItems& left, const CItems& right, MergeLimit& limit) {
   const RowRange r = DataRows(right);
   const Columns c(left.Columns());
   const int64_t most = int64_t{l.rows} + r.rows + 1;
-  ResultWriter out(left.Columns(), limit.max_rows > 0 ? std::min<int64_t>(most, limit.max_rows) : most);
+  ResultWriter out(left.Columns(),
+                   limit.max_rows > 0 ? std::min<int64_t>(most, limit.max_rows) : most);
   int32_t i = 0;
   int32_t j = 0;
   while (i < l.rows || j < r.rows) {
@@ -160,7 +161,8 @@ CItems MergeNear(const CItems& left, const CItems& right, int32_t distance, int3
   const Columns c(left.Columns());
   const bool copy_unmatched = distance == -1;
   const int64_t most = int64_t{l.rows} + r.rows + 1;
-  ResultWriter out(left.Columns(), limit.max_rows > 0 ? std::min<int64_t>(most, limit.max_rows) : most);
+  ResultWriter out(left.Columns(),
+                   limit.max_rows > 0 ? std::min<int64_t>(most, limit.max_rows) : most);
   const int32_t adjacent_bonus = 200 / word_count;
   int32_t i = 0;
   int32_t j = 0;

@@ -3,10 +3,10 @@
 // rows a plain scan of the source text selects.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cctype>
 #include <random>
 #include <set>
-#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -37,7 +37,8 @@ class BruteForceCheckTest : public test::SearchFixture {
       Sentences sentences(1);
       const int words = length(random);
       for (int w = 0; w < words; ++w) {
-        const std::string& word = vocabulary_[static_cast<std::size_t>(pick(random)) % vocabulary_.size()];
+        const std::string& word =
+            vocabulary_[static_cast<std::size_t>(pick(random)) % vocabulary_.size()];
         body += (body.empty() ? "" : " ") + word;
         sentences.back().push_back(Upper(word));
         if (sentence_end(random) == 0 && w + 1 < words) {
@@ -73,7 +74,8 @@ class BruteForceCheckTest : public test::SearchFixture {
   bool HasPhrase(const Sentences& row, const std::vector<std::string>& phrase) const {
     for (const auto& sentence : row) {
       for (std::size_t at = 0; at + phrase.size() <= sentence.size(); ++at) {
-        if (std::equal(phrase.begin(), phrase.end(), sentence.begin() + static_cast<std::ptrdiff_t>(at))) {
+        if (std::equal(phrase.begin(), phrase.end(),
+                       sentence.begin() + static_cast<std::ptrdiff_t>(at))) {
           return true;
         }
       }
@@ -97,7 +99,9 @@ class BruteForceCheckTest : public test::SearchFixture {
 TEST_F(BruteForceCheckTest, RandomConditionsFindTheRowsAScanFinds) {
   std::mt19937 random(7);
   std::geometric_distribution<int> pick(0.08);
-  auto word = [&] { return vocabulary_[static_cast<std::size_t>(pick(random)) % vocabulary_.size()]; };
+  auto word = [&] {
+    return vocabulary_[static_cast<std::size_t>(pick(random)) % vocabulary_.size()];
+  };
   int checked = 0;
   int non_empty = 0;
   for (int round = 0; round < 60; ++round) {
@@ -120,10 +124,12 @@ TEST_F(BruteForceCheckTest, RandomConditionsFindTheRowsAScanFinds) {
         {"NOT CORPUS='" + a + "'", Scan([&](const Sentences& r) { return !Has(r, A); })},
         {"(CORPUS='" + a + "' OR CORPUS='" + b + "') AND CORPUS='" + c + "'",
          Scan([&](const Sentences& r) { return (Has(r, A) || Has(r, B)) && Has(r, C); })},
-        {"CORPUS='" + a + " " + b + "'",
-         Scan([&](const Sentences& r) { return HasPhrase(r, {A, B}); })},
-        {"CORPUS='" + a + " " + b + " " + c + "'",
-         Scan([&](const Sentences& r) { return HasPhrase(r, {A, B, C}); })},
+        {"CORPUS='" + a + " " + b + "'", Scan([&](const Sentences& r) {
+           return HasPhrase(r, {A, B});
+         })},
+        {"CORPUS='" + a + " " + b + " " + c + "'", Scan([&](const Sentences& r) {
+           return HasPhrase(r, {A, B, C});
+         })},
     };
     for (const Query& q : queries) {
       SCOPED_TRACE(q.condition);

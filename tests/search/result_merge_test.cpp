@@ -67,43 +67,90 @@ TEST_F(ResultMergeTest, OperatorsKeepTheRowsAndScoresOfTheirRules) {
   const std::vector<MergeCase> cases = {
       {"AND adds scores", 1, 0, 0, 1, a, b, {{3, 25, 4}, {5, 37, 9}}},
       {"AND with an empty side", 1, 0, 0, 1, a, {}, {}},
-      {"OR unions by key", 2, 0, 0, 1, a, b,
-       {{1, 10, 1}, {3, 25, 4}, {4, 6, 1}, {5, 37, 9}}},
+      {"OR unions by key", 2, 0, 0, 1, a, b, {{1, 10, 1}, {3, 25, 4}, {4, 6, 1}, {5, 37, 9}}},
       {"OR with an empty side copies the other", 2, 0, 0, 1, {}, b, b},
       {"FILTER keeps left scores", 4, 0, 0, 1, a, b, {{3, 20, 4}, {5, 30, 9}}},
       {"AND NOT keeps the left tail", 8, 0, 0, 1, a, {{3, 1, 1}}, {{1, 10, 1}, {5, 30, 9}}},
       {"FILTER NOT", 9, 0, 0, 1, a, b, {{1, 10, 1}}},
       {"unknown code", 3, 0, 0, 1, a, b, {}},
       // Adjacency: the left position must be the right one less one.
-      {"adjacent pair, bonus 200/2", 6, 0, 0, 2, {{7, 1, 3}, {8, 1, 3}}, {{7, 2, 4}, {8, 2, 6}},
+      {"adjacent pair, bonus 200/2",
+       6,
+       0,
+       0,
+       2,
+       {{7, 1, 3}, {8, 1, 3}},
+       {{7, 2, 4}, {8, 2, 6}},
        {{7, 103, 3}}},
-      {"adjacency walks positions", 6, 0, 0, 1, {{7, 0, 1}, {7, 0, 5}, {7, 0, 9}},
-       {{7, 0, 3}, {7, 0, 6}}, {{7, 200, 5}}},
+      {"adjacency walks positions",
+       6,
+       0,
+       0,
+       1,
+       {{7, 0, 1}, {7, 0, 5}, {7, 0, 9}},
+       {{7, 0, 3}, {7, 0, 6}},
+       {{7, 200, 5}}},
       // NEAR/3 with a one-word left side: distance 4.
       {"NEAR right word 5 after", 11, 0, 4, 2, {{1, 0, 10}}, {{1, 0, 15}}, {{1, 21, 10}}},
       {"NEAR right word 6 after", 11, 0, 4, 2, {{1, 0, 10}}, {{1, 0, 16}}, {}},
-      {"NEAR right word before keeps the right row", 11, 0, 4, 1, {{1, 0, 10}}, {{1, 0, 8}},
+      {"NEAR right word before keeps the right row",
+       11,
+       0,
+       4,
+       1,
+       {{1, 0, 10}},
+       {{1, 0, 8}},
        {{1, 44, 8}}},
-      {"NEAR next word scores as adjacency", 11, 0, 4, 2, {{1, 4, 10}}, {{1, 6, 11}},
+      {"NEAR next word scores as adjacency",
+       11,
+       0,
+       4,
+       2,
+       {{1, 4, 10}},
+       {{1, 6, 11}},
        {{1, 110, 10}}},
-      {"NEAR finds a later left occurrence", 11, 0, 3, 1, {{1, 0, 1}, {1, 0, 20}},
-       {{1, 0, 22}}, {{1, 48, 20}}},
-      {"NEAR finds a later right occurrence", 11, 0, 3, 1, {{1, 0, 30}}, {{1, 0, 2}, {1, 0, 29}},
+      {"NEAR finds a later left occurrence",
+       11,
+       0,
+       3,
+       1,
+       {{1, 0, 1}, {1, 0, 20}},
+       {{1, 0, 22}},
+       {{1, 48, 20}}},
+      {"NEAR finds a later right occurrence",
+       11,
+       0,
+       3,
+       1,
+       {{1, 0, 30}},
+       {{1, 0, 2}, {1, 0, 29}},
        {{1, 46, 29}}},
-      {"NEAR far beyond 25 adds no negative bonus", 11, 0, 0, 1, {{1, 1, 1}}, {{1, 2, 100}},
+      {"NEAR far beyond 25 adds no negative bonus",
+       11,
+       0,
+       0,
+       1,
+       {{1, 1, 1}},
+       {{1, 2, 100}},
        {{1, 3, 1}}},
       // Proximity: AND, OR, adjacency, AND NOT and NEAR become it.
-      {"=| without a number copies unmatched", 2, 16, -1, 2, {{1, 1, 1}, {2, 1, 1}},
-       {{2, 1, 2}, {3, 1, 1}}, {{1, 1, 1}, {2, 102, 1}, {3, 1, 1}}},
+      {"=| without a number copies unmatched",
+       2,
+       16,
+       -1,
+       2,
+       {{1, 1, 1}, {2, 1, 1}},
+       {{2, 1, 2}, {3, 1, 1}},
+       {{1, 1, 1}, {2, 102, 1}, {3, 1, 1}}},
       {"=|2 drops a pair 3 apart", 6, 16, 2, 1, {{2, 0, 1}}, {{2, 0, 5}}, {}},
       {"=|3 keeps it", 6, 16, 3, 1, {{2, 0, 1}}, {{2, 0, 5}}, {{2, 44, 1}}},
       {"FILTER is untouched by =|", 4, 16, -1, 1, a, b, {{3, 20, 4}, {5, 30, 9}}},
   };
   for (const MergeCase& c : cases) {
     SCOPED_TRACE(c.name);
-    const CItems merged = rowset_.MergeTwoResultset(Result(Set(1, 1), c.left),
-                                                    Result(Set(1, 1), c.right), c.code, c.flags,
-                                                    c.distance, c.word_count);
+    const CItems merged =
+        rowset_.MergeTwoResultset(Result(Set(1, 1), c.left), Result(Set(1, 1), c.right), c.code,
+                                  c.flags, c.distance, c.word_count);
     EXPECT_EQ(RowsOf(merged), c.expected);
   }
 }
@@ -113,8 +160,7 @@ TEST_F(ResultMergeTest, ArraysWithoutScoresOrPositions) {
   const CItems left = Result(Set(0, 0), {{1}, {2}, {4}});
   const CItems right = Result(Set(0, 0), {{2}, {3}});
   EXPECT_EQ(RowsOf(rowset_.MergeTwoResultset(left, right, 1, 0, 0, 1)), (Rows{{2}}));
-  EXPECT_EQ(RowsOf(rowset_.MergeTwoResultset(left, right, 2, 0, 0, 1)),
-            (Rows{{1}, {2}, {3}, {4}}));
+  EXPECT_EQ(RowsOf(rowset_.MergeTwoResultset(left, right, 2, 0, 0, 1)), (Rows{{1}, {2}, {3}, {4}}));
   struct ErrorCase {
     const char* name;
     CColumnSet left, right;
@@ -157,16 +203,16 @@ TEST_F(ResultMergeTest, CacheSizeCutsOrAndNearMergesAndSetsTheTruncatedFlag) {
 
   CGiTreeRowset roomy(defs_);
   roomy.SetCacheSize(41 * 12);
-  EXPECT_EQ(roomy.MergeTwoResultset(Result(Set(1, 1), odd), Result(Set(1, 1), even), 7, 0, -1, 1)
-                .Count(),
-            41);
+  EXPECT_EQ(
+      roomy.MergeTwoResultset(Result(Set(1, 1), odd), Result(Set(1, 1), even), 7, 0, -1, 1).Count(),
+      41);
   EXPECT_FALSE(roomy.IsTruncated()) << "everything fitted";
 
   CGiTreeRowset tight(defs_);
   tight.SetCacheSize(5 * 12);
-  EXPECT_EQ(tight.MergeTwoResultset(Result(Set(1, 1), odd), Result(Set(1, 1), even), 7, 0, -1, 1)
-                .Count(),
-            5);
+  EXPECT_EQ(
+      tight.MergeTwoResultset(Result(Set(1, 1), odd), Result(Set(1, 1), even), 7, 0, -1, 1).Count(),
+      5);
   EXPECT_TRUE(tight.IsTruncated());
 }
 
@@ -180,7 +226,10 @@ TEST_F(ResultMergeTest, ReduceItemsKeepsTheLastRowOfEachKey) {
   };
   const std::vector<Case> cases = {
       // Score = 200 / words + rows of the key + the highest score.
-      {"scores", Set(1, 1), 2, {{1, 5, 1}, {1, 9, 4}, {1, 2, 8}, {4, 0, 3}},
+      {"scores",
+       Set(1, 1),
+       2,
+       {{1, 5, 1}, {1, 9, 4}, {1, 2, 8}, {4, 0, 3}},
        {{1, 100 + 3 + 9, 8}, {4, 100 + 1 + 0, 3}}},
       {"positions only", Set(0, 1), 1, {{2, 1}, {2, 7}, {3, 1}}, {{2, 7}, {3, 1}}},
       {"empty", Set(1, 1), 1, {}, {}},

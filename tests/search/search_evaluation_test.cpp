@@ -136,6 +136,9 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
       {"AMOUNTS<='20'", {1, 2}, ""},
       {"AMOUNTS<'25'", {1, 2}, ""},
       {"AMOUNTS='10' OR '30'", {1, 3}, ""},
+      {"AMOUNTS!='20'", {1, 3}, ""},
+      {"NOT PRICES='7.25'", {1}, ""},
+      {"NOT SEEN='2025-01-31'", {1}, ""},
       {"AMOUNTS='abc'", {}, "Not a valid integer (Module:GiTreeRowset,Method:SearchNext)"},
       {"AMOUNTS='12abc'", {}, "Not a valid integer"},
       {"AMOUNTS='99999999999'", {}, "Not a valid integer"},
@@ -235,8 +238,9 @@ TEST_F(SearchEvaluationTest, WindowsAndAppendedCommands) {
   BuildWines();
   CGlobalDefs defs = Defs();
   CGiTreeRowset rowset(defs);
-  rowset.Commands().Add(std::make_unique<CGiCmdTree>(defs)).SplitSqlW(
-      u"SELECT ID FROM T WHERE [WINES='red' OR WINES='water']");
+  rowset.Commands()
+      .Add(std::make_unique<CGiCmdTree>(defs))
+      .SplitSqlW(u"SELECT ID FROM T WHERE [WINES='red' OR WINES='water']");
   rowset.StartRowset(1, false);
   ASSERT_EQ(rowset.GetTotal(), 8);
   EXPECT_EQ(rowset.SqlOrder(), "id ASC");
@@ -244,8 +248,8 @@ TEST_F(SearchEvaluationTest, WindowsAndAppendedCommands) {
     int32_t start, count;
     int32_t first, num;
   };
-  const std::vector<Window> windows = {
-      {5, 10, 5, 4}, {1, 3, 1, 3}, {8, 1, 8, 1}, {9, 5, 9, 0}, {-2, 2, 1, 2}, {3, -1, 3, 0}};
+  const std::vector<Window> windows = {{5, 10, 5, 4}, {1, 3, 1, 3},  {8, 1, 8, 1},
+                                       {9, 5, 9, 0},  {-2, 2, 1, 2}, {3, -1, 3, 0}};
   for (const Window& w : windows) {
     SCOPED_TRACE(std::to_string(w.start) + "," + std::to_string(w.count));
     rowset.SetLimits(w.start, w.count);
@@ -253,8 +257,9 @@ TEST_F(SearchEvaluationTest, WindowsAndAppendedCommands) {
     EXPECT_EQ(rowset.GetNum(), w.num);
   }
 
-  rowset.Commands().Add(std::make_unique<CGiCmdTree>(defs)).SplitSqlW(
-      u"SELECT ID FROM T WHERE [WINES='python']");
+  rowset.Commands()
+      .Add(std::make_unique<CGiCmdTree>(defs))
+      .SplitSqlW(u"SELECT ID FROM T WHERE [WINES='python']");
   rowset.StartRowset(2, true);
   EXPECT_EQ(rowset.GetCommandCount(), 2);
   EXPECT_EQ(rowset.GetTotal(), 10);
@@ -263,9 +268,9 @@ TEST_F(SearchEvaluationTest, WindowsAndAppendedCommands) {
   for (int32_t i = 1; i < result.Count(); ++i) {
     key_and_command.emplace_back(result.Key(i), result.Row(i)[result.Width() - 1]);
   }
-  EXPECT_EQ(key_and_command, (std::vector<std::pair<int32_t, int32_t>>{
-                                 {1, 1}, {2, 1}, {3, 1}, {4, 1}, {5, 1}, {6, 1}, {10, 1}, {11, 1},
-                                 {7, 2}, {8, 2}}));
+  EXPECT_EQ(key_and_command,
+            (std::vector<std::pair<int32_t, int32_t>>{
+                {1, 1}, {2, 1}, {3, 1}, {4, 1}, {5, 1}, {6, 1}, {10, 1}, {11, 1}, {7, 2}, {8, 2}}));
 }
 
 TEST_F(SearchEvaluationTest, MissingFindexAndDamagedDeletedKeysAreErrors) {

@@ -40,9 +40,9 @@ class SearchFixture : public CommandFixture {
   // Index options for the next builds: scores and phrases as asked, no
   // language step (every word indexed as written).
   void Options(bool scores, bool phrases) {
-    ASSERT_EQ(command_->SetIndexGeneralOptions(scores ? -1 : 0, phrases ? -1 : 0, 0, nullptr, -1,
-                                               -1),
-              S_OK);
+    ASSERT_EQ(
+        command_->SetIndexGeneralOptions(scores ? -1 : 0, phrases ? -1 : 0, 0, nullptr, -1, -1),
+        S_OK);
     ASSERT_EQ(command_->SetIndexLanguageOptions(2, 0, 0, 0, 0, 0), S_OK);
   }
 
@@ -53,8 +53,9 @@ class SearchFixture : public CommandFixture {
     rowset.SetCacheSize(cache_size);
     Found found;
     try {
-      rowset.Commands().Add(std::make_unique<CGiCmdTree>(defs)).SplitSqlW(
-          Utf8ToUtf16("SELECT ID FROM T WHERE [" + condition + "]"));
+      rowset.Commands()
+          .Add(std::make_unique<CGiCmdTree>(defs))
+          .SplitSqlW(Utf8ToUtf16("SELECT ID FROM T WHERE [" + condition + "]"));
       rowset.StartRowset(1, false);
     } catch (const CExceptionBase& e) {
       found.error = Utf16ToUtf8(e.GetFullText(100));

@@ -13,7 +13,7 @@
 namespace qm {
 namespace {
 
-using Keys = std::vector<int32_t>;
+using KeyList = std::vector<int32_t>;
 
 class SearchEvaluationTest : public test::SearchFixture {
  protected:
@@ -40,7 +40,7 @@ TEST_F(SearchEvaluationTest, OperatorsModifiersAndPatternsFindTheRowsTheyDescrib
   BuildWines();
   struct Case {
     const char* condition;
-    Keys keys;
+    KeyList keys;
   };
   const std::vector<Case> cases = {
       {"WINES='wine'", {1, 2, 3, 4, 5, 10}},
@@ -101,7 +101,7 @@ TEST_F(SearchEvaluationTest, ProximityFindsEitherWordAndRanksCloseWordsHigher) {
   BuildWines();
   const test::Found found = Search("WINES=|'red wine'");
   ASSERT_EQ(found.error, "");
-  EXPECT_EQ(found.keys, (Keys{1, 2, 3, 4, 5, 10, 11}));
+  EXPECT_EQ(found.keys, (KeyList{1, 2, 3, 4, 5, 10, 11}));
   const auto score = [&](int32_t key) {
     return found.scores[static_cast<std::size_t>(
         std::find(found.keys.begin(), found.keys.end(), key) - found.keys.begin())];
@@ -109,7 +109,7 @@ TEST_F(SearchEvaluationTest, ProximityFindsEitherWordAndRanksCloseWordsHigher) {
   EXPECT_GT(score(1), score(11)) << "adjacent words against one word";
   EXPECT_GT(score(1), score(3)) << "adjacent words against words two apart";
   // With a distance, only rows with both words within it remain.
-  EXPECT_EQ(Search("WINES=|1'red wine'").keys, (Keys{1, 2, 4, 10}));
+  EXPECT_EQ(Search("WINES=|1'red wine'").keys, (KeyList{1, 2, 4, 10}));
 }
 
 TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherType) {
@@ -122,7 +122,7 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
   ASSERT_EQ(Run("CREATE FINDEX Seen ON TABLE nums COLUMNS seen KEY id"), "");
   struct Case {
     const char* condition;
-    Keys keys;
+    KeyList keys;
     const char* error;  // a text the failure holds
   };
   const std::vector<Case> cases = {
@@ -156,8 +156,39 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
     SCOPED_TRACE(c.condition);
     const test::Found found = Search(c.condition);
     EXPECT_NE(found.error.find(c.error), std::string::npos) << found.error;
-    if (*c.error == '\0') EXPECT_EQ(found.error, "");
+    if (*c.error == '\0') {
+      EXPECT_EQ(found.error, "");
+    }
     EXPECT_EQ(found.keys, c.keys);
+  }
+}
+
+TEST_F(SearchEvaluationTest, SearchWordsAreNormalisedAsTheIndexerDid) {
+  Sql({"create table words (id integer, body varchar(50))",
+       "insert into words values (1, 'the runner runs')",
+       "insert into words values (2, 'running water')", "insert into words values (3, 'smith')",
+       "insert into words values (4, 'smyth')", "insert into words values (5, 'runway')"});
+  Options(false, true);
+  // English stemming, then the phonetic code.
+  ASSERT_EQ(command_->SetIndexLanguageOptions(2, -1, -1, 0, 0, 0), S_OK);
+  ASSERT_EQ(Run("CREATE FINDEX Words ON TABLE words COLUMNS body KEY id"), "");
+  struct Case {
+    const char* condition;
+    KeyList keys;
+  };
+  const std::vector<Case> cases = {
+      {"WORDS='run'", {1, 2}},
+      {"WORDS='runs'", {1, 2}},
+      {"WORDS='Running'", {1, 2}},
+      {"WORDS='smith'", {3, 4}},
+      {"WORDS='smith' AND NOT WORDS='smyth'", {}},
+      {"WORDS='runner runs'", {1}},
+      {"WORDS='runs runner'", {}},
+      {"WORDS='running water'", {2}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.condition);
+    EXPECT_EQ(Keys(c.condition), c.keys);
   }
 }
 
@@ -165,10 +196,10 @@ TEST_F(SearchEvaluationTest, DeletedKeysNeverAppear) {
   BuildWines();
   ASSERT_EQ(Run("DELETE FROM FINDEX Wines 3"), "");
   ASSERT_EQ(Run("DELETE FROM FINDEX Wines 10"), "");
-  EXPECT_EQ(Keys("WINES='wine'"), (Keys{1, 2, 4, 5}));
-  EXPECT_EQ(Keys("WINES='beer'"), Keys{});
-  EXPECT_EQ(Keys("NOT WINES='cheese'"), (Keys{1, 2, 4, 6, 7, 8, 11}));
-  EXPECT_EQ(Keys("WINES='w*'"), (Keys{1, 2, 4, 5, 6}));
+  EXPECT_EQ(Keys("WINES='wine'"), (KeyList{1, 2, 4, 5}));
+  EXPECT_EQ(Keys("WINES='beer'"), KeyList{});
+  EXPECT_EQ(Keys("NOT WINES='cheese'"), (KeyList{1, 2, 4, 6, 7, 8, 11}));
+  EXPECT_EQ(Keys("WINES='w*'"), (KeyList{1, 2, 4, 5, 6}));
 }
 
 TEST_F(SearchEvaluationTest, AddOnFindexesJoinTheirFindexInKeyOrder) {
@@ -192,7 +223,7 @@ TEST_F(SearchEvaluationTest, AddOnFindexesJoinTheirFindexInKeyOrder) {
 
   struct Case {
     const char* condition;
-    Keys keys;
+    KeyList keys;
   };
   const std::vector<Case> cases = {
       {"BIG='two'", {667, 670}},
@@ -202,6 +233,88 @@ TEST_F(SearchEvaluationTest, AddOnFindexesJoinTheirFindexInKeyOrder) {
       {"BIG='w66*'", {66, 660, 661, 662, 663, 664, 665, 666, 668, 670}},
       {"BIG='w66b' OR BIG='two'", {66, 667, 670}},
       {"BIG='two words'", {667}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.condition);
+    EXPECT_EQ(Keys(c.condition), c.keys);
+  }
+}
+
+// A record file: block 0 of a 4,096-byte block file, the used byte count
+// first, then the fields (ints 4 bytes, texts a 16-bit length and the bytes,
+// dates 16 bytes), little-endian.
+class RecordWriter {
+ public:
+  RecordWriter& Int(int32_t v) {
+    for (int i = 0; i < 4; ++i)
+      bytes_.push_back(static_cast<char>(static_cast<uint32_t>(v) >> (8 * i)));
+    return *this;
+  }
+  RecordWriter& Text(const std::string& text) {
+    bytes_.push_back(static_cast<char>(text.size() & 0xFF));
+    bytes_.push_back(static_cast<char>(text.size() >> 8));
+    bytes_ += text;
+    return *this;
+  }
+  RecordWriter& Date() {
+    bytes_ += std::string("\xE8\x07\x01\x00\x02\x00", 6) + std::string(10, '\0');
+    return *this;
+  }
+  std::string Block() const {
+    std::string block(4096, '\0');
+    const auto used = static_cast<uint32_t>(bytes_.size());
+    for (int i = 0; i < 4; ++i)
+      block[static_cast<std::size_t>(i)] = static_cast<char>(used >> (8 * i));
+    block.replace(6, bytes_.size() - 6, bytes_.substr(6));
+    return block;
+  }
+
+ private:
+  std::string bytes_ = std::string(6, '\0');
+};
+
+TEST_F(SearchEvaluationTest, RepositoriesSearchEveryMemberFindexAsOne) {
+  const std::string folder = GroupFolder() + "Repositories/";
+  std::filesystem::create_directories(folder);
+  struct Member {
+    const char* collector;
+    int32_t number;
+    std::vector<std::string> rows;
+  };
+  const std::vector<Member> members = {{"C1", 4, {"1, 'river'", "2, 'lake'"}},
+                                       {"C2", 9, {"3, 'river'", "7, 'sea'"}},
+                                       {"C3", 12, {"5, 'river'", "2, 'river'"}}};
+  RecordWriter repository;
+  repository.Int(1).Text("x").Date().Text("y").Text("").Date().Int(7).Int(3);
+  for (const Member& m : members) {
+    const std::string table = std::string("lib_") + m.collector;
+    std::vector<std::string> statements{"create table " + table + " (id integer, t varchar(20))"};
+    for (const std::string& row : m.rows)
+      statements.push_back("insert into " + table + " values (" + row + ")");
+    Sql(statements);
+    ASSERT_EQ(Run("CREATE FINDEX _R_LIB_" + std::to_string(m.number) + " ON TABLE " + table +
+                  " COLUMNS t KEY id"),
+              "");
+    RecordWriter collector;
+    collector.Int(1).Text("a").Date().Date().Text("b").Text("c").Int(m.number);
+    collector.Text("").Int(5).Int(0).Int(0).Int(0).Text("s1").Text("s2");
+    test::WriteFile(folder + "LIB_" + m.collector + ".col", collector.Block());
+    repository.Text(m.collector).Int(5);
+  }
+  test::WriteFile(folder + "LIB.rep", repository.Block());
+  ASSERT_EQ(Run("DELETE FROM FINDEX _R_LIB_12 5"), "");
+
+  struct Case {
+    const char* condition;
+    KeyList keys;
+  };
+  const std::vector<Case> cases = {
+      {"LIB='river'", {1, 2, 3}},
+      {"LIB='riv*'", {1, 2, 3}},
+      {"LIB='river' AND NOT LIB='lake'", {1, 3}},
+      {"NOT LIB='river'", {7}},
+      {"LIB='sea' OR LIB='lake'", {2, 7}},
+      {"LIB>'lake'", {1, 2, 3, 7}},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.condition);
@@ -224,11 +337,11 @@ TEST_F(SearchEvaluationTest, CacheSizeCutsReadsAndMergesAndSaysSo) {
   EXPECT_FALSE(whole.truncated);
   // Ten row widths: 9 rows and the count row.
   const test::Found cut = Search("COUNTS='alpha' OR COUNTS='beta'", 10 * 12);
-  EXPECT_EQ(cut.keys, (Keys{1, 2, 3, 4, 5, 6, 7, 8, 9}));
+  EXPECT_EQ(cut.keys, (KeyList{1, 2, 3, 4, 5, 6, 7, 8, 9}));
   EXPECT_TRUE(cut.truncated);
   const test::Found word = Search("COUNTS='alpha'", 10 * 12);
   EXPECT_TRUE(word.truncated);
-  EXPECT_EQ(word.keys, (Keys{1, 3, 5, 7, 9, 11, 13, 15, 17}));
+  EXPECT_EQ(word.keys, (KeyList{1, 3, 5, 7, 9, 11, 13, 15, 17}));
   const test::Found roomy = Search("COUNTS='alpha'", 21 * 12);
   EXPECT_FALSE(roomy.truncated);
   EXPECT_EQ(roomy.total, 20);

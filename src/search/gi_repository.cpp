@@ -1,5 +1,7 @@
 #include "search/gi_repository.h"
 
+#include <new>
+
 #include "base/exception_family.h"
 #include "base/plain_name.h"
 #include "base/trace.h"
@@ -77,6 +79,10 @@ void CGiRepository::OpenRepository(std::string_view name) {
     Close();
     try {
       for (const std::string& findex : ResolveNames(defs_, name)) OpenMember(findex);
+    } catch (const std::bad_alloc&) {
+      Close();
+      // The findex array could not grow.
+      throw CGiRepositoryException::Numbered(11, "OpenRepository", nullptr);
     } catch (...) {
       Close();
       throw;

@@ -113,6 +113,19 @@ TEST_F(FindexLookupTest, WildcardsAndBackslashesMatchExactlyAsWritten) {
     EXPECT_EQ(found.error, "");
     EXPECT_EQ(KeySet(found), c.keys);
   }
+  // The parser cuts values with the findex's own separators.
+  CGiRepository marks(defs_);
+  marks.OpenRepository("LkMarks");
+  EXPECT_EQ(marks.GetSeparators(), u" ");
+  ASSERT_EQ(command_->SetIndexGeneralOptions(VARIANT_FALSE, VARIANT_TRUE, VARIANT_FALSE, T(""),
+                                             VARIANT_TRUE, VARIANT_FALSE),
+            S_OK);
+  Build("LkPlain", "varchar(40)", {"1, 'x'"});
+  CGiRepository plain(defs_);
+  plain.OpenRepository("LkPlain");
+  const std::u16string defaults = plain.GetSeparators();
+  EXPECT_NE(defaults.find(u';'), std::u16string::npos);
+  EXPECT_NE(defaults.find(u'\t'), std::u16string::npos);
 }
 
 struct ValueCase {
@@ -219,6 +232,9 @@ TEST_F(FindexLookupTest, TheReadLimitCutsAWordsItemsAndSaysSo) {
     // The count row says how many rows of the run were read.
     EXPECT_EQ(items.Key(0), c.rows);
   }
+  EXPECT_NE(TraceText().find("Quick Search. Number of items found in " + IndexFolder() +
+                              "LKCACHE.fst (including count item) : 21"),
+            std::string::npos);
   // A pattern stops at the limit, across its words.
   const Found cut = Text("LkCache", u"FISH*", 0, -1, 8 * 15);
   EXPECT_TRUE(cut.truncated);

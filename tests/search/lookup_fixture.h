@@ -39,6 +39,8 @@ class LookupFixture : public CommandFixture {
     ASSERT_EQ(command_->SetIndexLanguageOptions(2, VARIANT_FALSE, VARIANT_FALSE, VARIANT_FALSE,
                                                 VARIANT_FALSE, VARIANT_FALSE),
               S_OK);
+    // Settings made after the trace level file, so the lookup's lines are written.
+    defs_ = CGlobalDefs();
     defs_.SetDataPath(home_.Data());
   }
 

@@ -252,6 +252,24 @@ std::vector<std::u16string_view> PlainTokens(std::u16string_view text) {
   return tokens;
 }
 
+// The orders named in an ORDER BY list (ORDER.COLUMN items) reach file
+// names when the result set attaches them.
+void RequirePlainOrderNames(std::u16string_view order) {
+  std::size_t start = 0;
+  while (start < order.size()) {
+    auto end = order.find(u',', start);
+    if (end == std::u16string_view::npos) end = order.size();
+    const std::u16string_view item = TrimBlanks(order.substr(start, end - start));
+    const std::u16string_view column = item.substr(0, item.find_first_of(kGiBlanks));
+    const auto dot = column.find(u'.');
+    if (dot != std::u16string_view::npos) {
+      RequirePlainName<CGiCmdTreeException>("order", Utf16ToUtf8(column.substr(0, dot)),
+                                            "StartBuildTreeW");
+    }
+    start = end + 1;
+  }
+}
+
 }  // namespace
 
 CGiCmdTree::CGiCmdTree(std::string language_folder, GiFindexFactsSource facts)
@@ -307,6 +325,7 @@ void CGiCmdTree::StartBuildTreeW(std::u16string_view condition) {
         break;
       }
     }
+    RequirePlainOrderNames(order);
     root_.reset();
     part_count_ = 0;
     if (TrimBlanks(text).empty()) {

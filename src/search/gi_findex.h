@@ -13,6 +13,7 @@
 // owner's, for an add-on) while the findex is open; CGiRepository does.
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -26,6 +27,7 @@
 
 namespace qm {
 
+class CExceptionBase;
 class CGlobalDefs;
 class CItems;
 class CWordPattern;
@@ -123,24 +125,36 @@ class CGiFIndex {
   static constexpr int32_t kBlockUnits = 64;  // 4,096-byte tree blocks
   // One leaf row as the scans see it.
   struct LeafRow;
-  class LeafWalk;
+  // Where the first word at or after a value stands.
+  struct Boundary {
+    int64_t position = 0;  // its run, or the item file's size when there is none
+    bool found = false;
+    bool equal = false;    // the word equals the value
+  };
 
   void OpenFiles(std::string_view name);
-  void ReadTreeBlock(int32_t number, CBlock& block);
+  void RequireOpen(const char* method) const;
+  // The tree block at a level (0 root .. 3 leaf), read unless that level
+  // already holds it.
+  CBlock& TreeBlock(int level, int32_t number);
   // The leaf block where value stands or would stand; 0 for an empty tree.
   int32_t Descend(const CValue& value);
-  // The position of the first word not below value (or above it, with
-  // after), the file's size when there is none.
-  int64_t BoundaryPosition(const CValue& value, bool after);
+  // The first word not below value, or above it with after.
+  Boundary FindBoundary(const CValue& value, bool after);
   // Walks the leaf chain from block, calling visit for every row until it
   // returns false.
   void WalkLeaves(int32_t block, const std::function<bool(const LeafRow&)>& visit);
-  CLookupResult ScanPattern(CItems& items, const CWordSearch& word, int64_t limit,
-                            bool append);
+  CLookupResult ScanPattern(CItems& items, const CWordSearch& word, int64_t limit);
   CLookupResult ScanSimilar(CItems& items, const CWordSearch& word, int32_t flags,
-                            int32_t modifier, int64_t limit, bool append);
-  int32_t ReadRange(CItems& items, int64_t start, int64_t stop, int64_t limit, bool& truncated);
-  [[noreturn]] void Damaged(const char* method, const std::string& what) const;
+                            int32_t modifier, int64_t limit);
+  int64_t RunEndAt(int64_t position);
+  void ReadFst(int64_t position, uint8_t* data, std::size_t n, const char* method);
+  // Appends the rows of [start, stop) under the limit; runs counts the runs
+  // among them. Returns the rows appended.
+  int32_t ReadRange(CItems& items, int64_t start, int64_t stop, int64_t limit, bool& truncated,
+                    int32_t& runs);
+  [[noreturn]] void Damaged(const char* method, const std::string& what,
+                            const CExceptionBase* inner = nullptr) const;
 
   const CGlobalDefs& defs_;
   BFile sdx_;
@@ -152,7 +166,9 @@ class CGiFIndex {
   CIndexHeader header_;
   int64_t block_count_ = 0;
   int64_t fst_size_ = 0;
-  CBlock block_{kBlockUnits};
+  std::array<int32_t, 4> levels_{};  // block number each level holds, 0 none
+  std::array<CBlock, 4> blocks_{CBlock(kBlockUnits), CBlock(kBlockUnits), CBlock(kBlockUnits),
+                                CBlock(kBlockUnits)};
 };
 
 }  // namespace qm

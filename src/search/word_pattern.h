@@ -51,6 +51,7 @@ class CWordPattern {
   std::string prefix8_;
   std::u16string literal_;
   bool wildcards_ = false;
+  bool prefix_star_only_ = false;
 };
 
 }  // namespace qm

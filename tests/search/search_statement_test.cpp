@@ -8,6 +8,7 @@
 #include "base/exception_family.h"
 #include "platform/text_encoding.h"
 #include "search/cmd_tree.h"
+#include "search/condition_shape.h"
 #include "support/raised_error.h"
 #include "text/language.h"
 #include "text/separators.h"
@@ -16,6 +17,7 @@ namespace qm {
 namespace {
 
 using test::Raised;
+using test::Shape;
 
 // The catalogue of these tests: text findexes TITLE, BODY, A, B, C, T with
 // the default separators and no stop words; STOPPED the same with English
@@ -35,39 +37,6 @@ GiFindexFacts FactsOf(const std::u16string& name) {
 
 CGiCmdTree NewCommand() {
   return CGiCmdTree(std::string(QM_SOURCE_DATA_DIR) + "Language/", FactsOf);
-}
-
-// The tree in a form that shows every kind and code: NAME{value} for a
-// condition (with ~flags:modifier when not a plain "="), words as written,
-// operators by name around their operands.
-std::string Shape(const CGiNode& node) {
-  switch (node.kind) {
-    case GiNodeKind::Word:
-      return Utf16ToUtf8(node.text);
-    case GiNodeKind::Condition: {
-      std::string out = Utf16ToUtf8(node.text);
-      if (node.flags != kGiCmpEqual || node.modifier != -1) {
-        out += "~" + std::to_string(node.flags) + ":" + std::to_string(node.modifier);
-      }
-      return out + "{" + Shape(*node.left) + "}";
-    }
-    case GiNodeKind::Negation:
-      return "NOT(" + Shape(*node.left) + ")";
-    case GiNodeKind::Operator:
-      break;
-  }
-  std::string name;
-  switch (node.op) {
-    case kGiOpAnd: name = "AND"; break;
-    case kGiOpOr: name = "OR"; break;
-    case kGiOpFilter: name = "FILTER"; break;
-    case kGiOpAdjacent: name = "ADJ"; break;
-    case kGiOpAndNot: name = "ANDNOT"; break;
-    case kGiOpFilterNot: name = "FILTERNOT"; break;
-    case kGiOpNear: name = "NEAR" + std::to_string(node.near_distance); break;
-    default: name = "OP" + std::to_string(node.op); break;
-  }
-  return name + "(" + Shape(*node.left) + "," + Shape(*node.right) + ")";
 }
 
 std::u16string Statement(const std::string& condition) {

@@ -32,8 +32,9 @@ decltype(auto) Guarded(const char* method, Body&& body) {
 // Takes text from position up to delimiter. Leading delimiters are skipped;
 // the delimiter counts only outside single-quoted literals and outside
 // regions enclosed in "#", and is consumed.
-std::u16string Cut(std::u16string_view text, std::size_t& position, char16_t delimiter) {
-  while (position < text.size() && text[position] == delimiter) ++position;
+std::u16string Cut(std::u16string_view text, std::size_t& position, char16_t delimiter,
+                   bool skip_leading = true) {
+  while (skip_leading && position < text.size() && text[position] == delimiter) ++position;
   std::u16string out;
   bool quoted = false;
   bool hashed = false;
@@ -213,9 +214,15 @@ int32_t CountParts(const CGiNode* node) {
   }
 }
 
-// Whether a comparison operator stands outside phrases and parentheses.
+// Whether a comparison operator stands outside phrases, at any depth of
+// parentheses.
 bool HasComparison(std::u16string_view text) {
-  return HideExpW(text).find_first_of(u"=<>") != std::u16string::npos;
+  bool quoted = false;
+  for (const char16_t c : text) {
+    if (c == u'\'') quoted = !quoted;  // a doubled quote toggles twice
+    if (!quoted && (c == u'=' || c == u'<' || c == u'>')) return true;
+  }
+  return false;
 }
 
 bool IsAsciiUpperEqual(std::u16string_view token, std::u16string_view keyword) {
@@ -245,6 +252,24 @@ std::vector<std::u16string_view> PlainTokens(std::u16string_view text) {
   return tokens;
 }
 
+// The orders named in an ORDER BY list (ORDER.COLUMN items) reach file
+// names when the result set attaches them.
+void RequirePlainOrderNames(std::u16string_view order) {
+  std::size_t start = 0;
+  while (start < order.size()) {
+    auto end = order.find(u',', start);
+    if (end == std::u16string_view::npos) end = order.size();
+    const std::u16string_view item = TrimBlanks(order.substr(start, end - start));
+    const std::u16string_view column = item.substr(0, item.find_first_of(kGiBlanks));
+    const auto dot = column.find(u'.');
+    if (dot != std::u16string_view::npos) {
+      RequirePlainName<CGiCmdTreeException>("order", Utf16ToUtf8(column.substr(0, dot)),
+                                            "StartBuildTreeW");
+    }
+    start = end + 1;
+  }
+}
+
 }  // namespace
 
 CGiCmdTree::CGiCmdTree(std::string language_folder, GiFindexFactsSource facts)
@@ -258,13 +283,13 @@ void CGiCmdTree::SplitSqlW(std::u16string_view statement) {
     work.push_back(u'#');
     std::size_t position = 0;
     std::u16string head = Cut(work, position, u'[');
-    std::u16string condition(TrimBlanks(Cut(work, position, u']')));
+    std::u16string condition(TrimBlanks(Cut(work, position, u']', false)));
     bool score = false;
     if (IsAsciiUpperEqual(condition, u"SCORE")) {
       score = true;
       head.append(u"SCORE");
       head.append(Cut(work, position, u'['));
-      condition = std::u16string(TrimBlanks(Cut(work, position, u']')));
+      condition = std::u16string(TrimBlanks(Cut(work, position, u']', false)));
     }
     if (condition.empty()) {
       throw CGiCmdTreeException::Numbered(kErrorEmptyCondition, "SplitSqlW", nullptr);
@@ -300,6 +325,7 @@ void CGiCmdTree::StartBuildTreeW(std::u16string_view condition) {
         break;
       }
     }
+    RequirePlainOrderNames(order);
     root_.reset();
     part_count_ = 0;
     if (TrimBlanks(text).empty()) {

@@ -21,7 +21,7 @@ class CSeparatorSet;
 class CGiCmdTree {
  public:
   // Findexes are looked up in the settings' catalogue; languages come from
-  // its Language folder.
+  // its Language folder. REQUIRES: defs outlives the command.
   explicit CGiCmdTree(const CGlobalDefs& defs);
   // Explicit language folder (ending in "/") and findex lookup.
   CGiCmdTree(std::string language_folder, GiFindexFactsSource facts);

@@ -8,6 +8,7 @@
 #include "base/exception_family.h"
 #include "platform/text_encoding.h"
 #include "search/cmd_tree.h"
+#include "search/condition_shape.h"
 #include "support/raised_error.h"
 #include "text/language.h"
 #include "text/separators.h"
@@ -16,6 +17,7 @@ namespace qm {
 namespace {
 
 using test::Raised;
+using test::Shape;
 
 // The catalogue of these tests: text findexes TITLE, BODY, A, B, C, T with
 // the default separators and no stop words; STOPPED the same with English
@@ -35,39 +37,6 @@ GiFindexFacts FactsOf(const std::u16string& name) {
 
 CGiCmdTree NewCommand() {
   return CGiCmdTree(std::string(QM_SOURCE_DATA_DIR) + "Language/", FactsOf);
-}
-
-// The tree in a form that shows every kind and code: NAME{value} for a
-// condition (with ~flags:modifier when not a plain "="), words as written,
-// operators by name around their operands.
-std::string Shape(const CGiNode& node) {
-  switch (node.kind) {
-    case GiNodeKind::Word:
-      return Utf16ToUtf8(node.text);
-    case GiNodeKind::Condition: {
-      std::string out = Utf16ToUtf8(node.text);
-      if (node.flags != kGiCmpEqual || node.modifier != -1) {
-        out += "~" + std::to_string(node.flags) + ":" + std::to_string(node.modifier);
-      }
-      return out + "{" + Shape(*node.left) + "}";
-    }
-    case GiNodeKind::Negation:
-      return "NOT(" + Shape(*node.left) + ")";
-    case GiNodeKind::Operator:
-      break;
-  }
-  std::string name;
-  switch (node.op) {
-    case kGiOpAnd: name = "AND"; break;
-    case kGiOpOr: name = "OR"; break;
-    case kGiOpFilter: name = "FILTER"; break;
-    case kGiOpAdjacent: name = "ADJ"; break;
-    case kGiOpAndNot: name = "ANDNOT"; break;
-    case kGiOpFilterNot: name = "FILTERNOT"; break;
-    case kGiOpNear: name = "NEAR" + std::to_string(node.near_distance); break;
-    default: name = "OP" + std::to_string(node.op); break;
-  }
-  return name + "(" + Shape(*node.left) + "," + Shape(*node.right) + ")";
 }
 
 std::u16string Statement(const std::string& condition) {
@@ -91,6 +60,7 @@ TEST(SearchStatement, ConditionsGroupAsTheGrammarSays) {
       {"A='x' AND B='y' AND C='z'", "AND(A{X},AND(B{Y},C{Z}))"},
       {"A='x' || B='y' && C='z'", "OR(A{X},AND(B{Y},C{Z}))"},
       {"(A='x' OR B='y') AND C='z'", "AND(OR(A{X},B{Y}),C{Z})"},
+      {"A='x' OR (B='y' AND C='z')", "OR(A{X},AND(B{Y},C{Z}))"},
       {"A='x' FILTER B='y' OR C='z'", "OR(FILTER(A{X},B{Y}),C{Z})"},
       {"A='x' AND B='y' FILTER C='z'", "FILTER(AND(A{X},B{Y}),C{Z})"},
       {"(TITLE='x')", "TITLE{X}"},
@@ -273,12 +243,16 @@ TEST(SearchStatement, StatementSplitsAroundTheCondition) {
        "SELECT SCORE,ID,TITLE FROM DOCS WHERE ", "", true, "SCORE", "BODY{WINE}"},
       {"SELECT [ score ],ID FROM T WHERE [\n TITLE='x'\t] ORDER BY ID",
        "SELECT SCORE,ID FROM T WHERE ", " ORDER BY ID", true, "", "TITLE{X}"},
+      {"SELECT ID FROM T WHERE D=#[# AND [TITLE='y']", "SELECT ID FROM T WHERE D=#[# AND ", "",
+       false, "", "TITLE{Y}"},
       {"SELECT ID FROM T WHERE N='[x]' AND [TITLE='y']", "SELECT ID FROM T WHERE N='[x]' AND ",
        "", false, "", "TITLE{Y}"},
       {"SELECT ID FROM T WHERE [ID='a]b'] AND D=#2001-01-01#", "SELECT ID FROM T WHERE ",
        " AND D=#2001-01-01#", false, "", "ID{A]B}"},
       {"SELECT ID FROM T WHERE [TITLE='x' order by title desc, score]",
        "SELECT ID FROM T WHERE ", "", false, "TITLE DESC, SCORE", "TITLE{X}"},
+      {"SELECT ID FROM T WHERE [TITLE='x' ORDER BY BOOKS.YEAR DESC]", "SELECT ID FROM T WHERE ",
+       "", false, "BOOKS.YEAR DESC", "TITLE{X}"},
       {"SELECT ID FROM T WHERE [TITLE='x order y']", "SELECT ID FROM T WHERE ", "", false, "",
        "TITLE{ADJ(X,ADJ(ORDER,Y))}"},
   };
@@ -361,7 +335,7 @@ TEST(SearchStatement, RefusedStatements) {
        "Illegal or missing end of phrase character \"'\"" + method("HideExpW")},
       {"SELECT ID FROM T WHERE [TITLE 'x']", 1,
        "Missing character \"=\", \"<\" or \">\"" + method("GetEQW")},
-      {"SELECT ID FROM T WHERE [A='x' AND ()]", 1,
+      {"SELECT ID FROM T WHERE [(B) AND A='x']", 1,
        "Missing character \"=\", \"<\" or \">\"" + method("GetEQW")},
       {"SELECT ID FROM T WHERE [TITLE=~123456'x']", 1,
        "Modifier number has more than 5 digits" + method("GetEQW")},
@@ -373,6 +347,8 @@ TEST(SearchStatement, RefusedStatements) {
        "Invalid findex name \"..\": " },
       {"SELECT ID FROM T WHERE [A/B='x']", 1, "Invalid findex name \"A/B\": "},
       {"SELECT ID FROM T WHERE [='x']", 1, "Invalid findex name \"\": "},
+      {"SELECT ID FROM T WHERE [A='x' ORDER BY ID, A/B.COL DESC]", 1,
+       "Invalid order name \"A/B\": "},
       {"SELECT ID FROM T WHERE [" + std::string(200, 'N') + "='x']", 1,
        "Findex name longer than 199 characters: " + std::string(60, 'N') +
            method("StartBuildTreeW")},

@@ -201,6 +201,27 @@ CItems CGiTreeRowset::Evaluate(const CGiNode& node, const Context& context) {
       const bool near_conditions = node.op == kGiOpNear &&
                                    node.left->kind == GiNodeKind::Condition &&
                                    node.right->kind == GiNodeKind::Condition;
+      // AND, FILTER and their negations only ask the right condition about
+      // the left side's keys: its rows are not reduced for keys the left
+      // side never meets.
+      const bool keyed = (node.op == kGiOpAnd || node.op == kGiOpFilter || node.op == kGiOpAndNot ||
+                          node.op == kGiOpFilterNot) &&
+                         (context.flags & kGiCmpProximity) == 0 &&
+                         node.right->kind == GiNodeKind::Condition;
+      if (keyed) {
+        const CItems left = Evaluate(*node.left, context);
+        const CItems right = EvaluateCondition(*node.right, false);
+        if (right.Columns().p == 0) {
+          return MergeTwoResultset(left, right, node.op, context.flags, 0, context.word_count);
+        }
+        return Guarded("MergeTwoResultset", [&] {
+          if (node.op == kGiOpAnd && !left.Columns().Equals(right.Columns())) {
+            throw CGiTreeRowsetException::Numbered(10, "MergeTwoResultset", nullptr);
+          }
+          return KeepByCondition(left, right, node.op,
+                                 std::max(1, CountWords(node.right->left.get())));
+        });
+      }
       CItems left =
           near_conditions ? EvaluateCondition(*node.left, false) : Evaluate(*node.left, context);
       CItems right =

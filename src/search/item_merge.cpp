@@ -72,24 +72,54 @@ struct Columns {
   }
 };
 
+// The first row from `from` on whose key is not below key: a galloping
+// search, so a short list meets a long one in far fewer steps than rows.
+int32_t FirstNotBelow(const RowRange& r, int32_t from, int32_t key) {
+  int32_t step = 1;
+  int32_t low = from;  // r.Row(low)[0] < key
+  int32_t high = from + 1;
+  while (high < r.rows && r.Row(high)[0] < key) {
+    low = high;
+    step *= 2;
+    high = static_cast<int32_t>(std::min<int64_t>(int64_t{high} + step, r.rows));
+  }
+  // r.Row(low) is below key; r.Row(high) is not (or high == r.rows).
+  while (high - low > 1) {
+    const int32_t middle = low + (high - low) / 2;
+    (r.Row(middle)[0] < key ? low : high) = middle;
+  }
+  return high;
+}
+
 // FILTER, AND NOT, FILTER NOT and AND: left rows kept by whether their key
-// occurs on the right.
-CItems KeepByRightKeys(const CItems& left, const CItems& right, bool keep_present,
-                       bool add_scores) {
+// occurs on the right. right_words > 0: the right rows are a condition's rows
+// before ReduceItems, and AND adds the score that reduction would give the
+// key's rows, computed for the keys met only.
+CItems KeepByRightKeys(const CItems& left, const CItems& right, bool keep_present, bool add_scores,
+                       int32_t right_words = 0) {
   const RowRange l = DataRows(left);
   const RowRange r = DataRows(right);
   const Columns c(left.Columns());
+  const Columns rc(right.Columns());
   ResultWriter out(left.Columns(), int64_t{l.rows} + 1);
   int32_t j = 0;
   for (int32_t i = 0; i < l.rows; ++i) {
     const int32_t key = l.Row(i)[0];
-    while (j < r.rows && r.Row(j)[0] < key) ++j;
+    if (j < r.rows && r.Row(j)[0] < key) j = FirstNotBelow(r, j, key);
     const bool present = j < r.rows && r.Row(j)[0] == key;
     if (present != keep_present) continue;
     int32_t* row = out.Add(l.Row(i));
-    if (present && add_scores && c.score >= 0) {
-      row[c.score] = AddScores(int64_t{row[c.score]} + r.Row(j)[c.score]);
+    if (!present || !add_scores || c.score < 0 || rc.score < 0) continue;
+    int64_t right_score = r.Row(j)[rc.score];
+    if (right_words > 0) {
+      int64_t best = right_score;
+      int32_t end = j + 1;
+      for (; end < r.rows && r.Row(end)[0] == key; ++end) {
+        best = std::max<int64_t>(best, r.Row(end)[rc.score]);
+      }
+      right_score = 200 / right_words + int64_t{end - j} + best;
     }
+    row[c.score] = AddScores(int64_t{row[c.score]} + right_score);
   }
   return out.Finish();
 }
@@ -226,6 +256,17 @@ CItems MergeNear(const CItems& left, const CItems& right, int32_t distance, int3
 
 }  // namespace
 
+CItems KeepByCondition(const CItems& left, const CItems& right, int32_t code, int32_t right_words) {
+  switch (code) {
+    case 1:
+      return KeepByRightKeys(left, right, true, true, std::max(1, right_words));
+    case 4:
+      return KeepByRightKeys(left, right, true, false);
+    default:
+      return KeepByRightKeys(left, right, false, false);
+  }
+}
+
 int32_t ResultRows(const CItems& items) { return std::max(0, items.Count() - 1); }
 
 CItems EmptyResult(const CColumnSet& columns) {
@@ -265,24 +306,35 @@ void ReduceItems(CItems& items, int32_t word_count) {
   word_count = std::max(1, word_count);
   const Columns c(items.Columns());
   const int32_t rows = ResultRows(items);
-  int32_t kept = 0;
-  for (int32_t i = 0; i < rows;) {
-    int32_t end = i + 1;
-    int64_t best = c.score >= 0 ? items.Row(i + 1)[c.score] : 0;
-    while (end < rows && items.Row(end + 1)[0] == items.Row(i + 1)[0]) {
-      if (c.score >= 0) best = std::max<int64_t>(best, items.Row(end + 1)[c.score]);
-      ++end;
+  if (rows > 0) {
+    const auto w = static_cast<std::size_t>(items.Width());
+    int32_t* out = items.Row(1);
+    const int32_t* at = out;
+    const int32_t* end = at + static_cast<std::size_t>(rows) * w;
+    int32_t kept = 0;
+    while (at < end) {
+      const int32_t key = at[0];
+      int64_t best = c.score >= 0 ? at[c.score] : 0;
+      const int32_t* next = at + w;
+      for (; next < end && next[0] == key; next += w) {
+        if (c.score >= 0) best = std::max<int64_t>(best, next[c.score]);
+      }
+      // The key's last row; out never passes it, so the copy cannot overlap.
+      const int32_t* last = next - w;
+      if (out != last) {
+        for (std::size_t k = 0; k < w; ++k) out[k] = last[k];
+      }
+      if (c.score >= 0) {
+        out[c.score] =
+            AddScores(200 / word_count + (next - at) / static_cast<std::ptrdiff_t>(w) + best);
+      }
+      out += w;
+      ++kept;
+      at = next;
     }
-    int32_t* target = items.Row(kept + 1);
-    std::memmove(target, items.Row(end), sizeof(int32_t) * static_cast<std::size_t>(items.Width()));
-    if (c.score >= 0) target[c.score] = AddScores(200 / word_count + int64_t{end - i} + best);
-    ++kept;
-    i = end;
-  }
-  if (items.Count() > 0) {
     items.Truncate(kept + 1);
-    StampCount(items);
   }
+  if (items.Count() > 0) StampCount(items);
 }
 
 void RemoveKeys(CItems& items, std::span<const int32_t> deleted,

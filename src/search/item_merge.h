@@ -39,6 +39,12 @@ void StampCount(CItems& items);
 CItems MergeResults(const CItems& left, const CItems& right, int32_t code, int32_t distance,
                     int32_t word_count, MergeLimit& limit);
 
+// AND (1), FILTER (4), AND NOT (8) or FILTER NOT (9) of a result and the
+// rows of a condition not yet reduced to one row per key (right_words: the
+// condition's words): the same rows and scores as reducing the right side
+// first, without reducing the keys the left side never meets.
+CItems KeepByCondition(const CItems& left, const CItems& right, int32_t code, int32_t right_words);
+
 // One row per key (the last of each key); with scores, its score becomes
 // 200 / word_count + the rows of the key + the highest score among them.
 void ReduceItems(CItems& items, int32_t word_count);

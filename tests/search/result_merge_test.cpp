@@ -242,6 +242,24 @@ TEST_F(ResultMergeTest, ReduceItemsKeepsTheLastRowOfEachKey) {
   }
 }
 
+TEST_F(ResultMergeTest, KeyedMergesOfAnUnreducedConditionEqualReducingItFirst) {
+  const CItems left = Result(Set(1, 1), {{1, 10, 3}, {4, 20, 1}, {6, 30, 2}, {9, 40, 7}});
+  // Keys 4 and 9 with several rows; 2 and 7 never met by the left side.
+  const CItems raw = Result(Set(1, 1), {{2, 1, 1}, {4, 5, 1}, {4, 9, 6}, {7, 3, 2}, {9, 2, 4},
+                                        {9, 8, 5}, {9, 1, 9}});
+  for (const int32_t words : {1, 2}) {
+    CItems reduced = Result(Set(1, 1), RowsOf(raw));
+    rowset_.ReduceItems(reduced, words);
+    for (const int32_t code : {1, 4, 8, 9}) {
+      SCOPED_TRACE("code " + std::to_string(code) + ", words " + std::to_string(words));
+      EXPECT_EQ(RowsOf(KeepByCondition(left, raw, code, words)),
+                RowsOf(rowset_.MergeTwoResultset(left, reduced, code, 0, 0, 1)));
+    }
+  }
+  // AND by hand: key 4 gains 200 + 2 rows + 9, key 9 gains 200 + 3 + 8.
+  EXPECT_EQ(RowsOf(KeepByCondition(left, raw, 1, 1)), (Rows{{4, 231, 1}, {9, 251, 7}}));
+}
+
 TEST_F(ResultMergeTest, RemoveKeysDropsDeletedKeysOnce) {
   CItems items = Result(Set(0, 1), {{1, 1}, {2, 1}, {2, 5}, {3, 1}, {9, 2}});
   std::vector<int32_t> met;

@@ -175,7 +175,9 @@ int32_t CGiFIndex::Descend(const CValue& value) {
     } catch (const CException& e) {
       Damaged("Descend", "tree block " + std::to_string(number) + " cannot be read", &e);
     }
-    if (child <= number || child >= block_count_) {
+    // A node written after a split comes after its first child, so only the
+    // range is checked; the descent has its fixed number of levels.
+    if (child < 2 || child == number || child >= block_count_) {
       Damaged("Descend", "tree block " + std::to_string(number) + " points to block " +
                              std::to_string(child));
     }

@@ -98,6 +98,58 @@ TEST_F(FindexLookupTest, TextWordsRangesPatternsAndSimilarWords) {
   }
 }
 
+TEST_F(FindexLookupTest, StartAndStopPositionsBoundTheRunsOfTheWordsInARange) {
+  Build("LkSpan", "varchar(40)", kTextRows);
+  Build("LkNone", "varchar(40)", {"1, NULL"});
+  CGiFIndex findex(defs_);
+  findex.Open("LkSpan");
+  const auto text = [](const char* utf8) {
+    CValue value;
+    value.SetText(utf8);
+    return value;
+  };
+  struct SpanCase {
+    const char* start;
+    const char* stop;
+    bool single;
+    int32_t result;
+    std::set<int32_t> keys;  // of the rows between the two positions
+  };
+  const std::vector<SpanCase> cases = {
+      {"FISH", "FISH", true, CGiFIndex::kFound, {7}},
+      {"FISHX", "FISHX", true, CGiFIndex::kNothingFound, {}},
+      {"B", "BAND", false, CGiFIndex::kFound, {4, 5}},
+      {"BANDANA", "FISHES", false, CGiFIndex::kFound, {6, 7, 9, 12}},
+      {"FISHZ", "\xC3\xBF", false, CGiFIndex::kStopBeyondEnd, {11}},
+      {"C", "D", false, CGiFIndex::kNothingFound, {}},
+  };
+  for (const SpanCase& c : cases) {
+    SCOPED_TRACE(std::string(c.start) + ".." + c.stop);
+    int64_t start = -1;
+    int64_t stop = -1;
+    EXPECT_EQ(findex.FindStartStop(text(c.start), text(c.stop), start, stop, c.single, 0),
+              c.result);
+    if (c.result == CGiFIndex::kNothingFound) continue;
+    if (c.result == CGiFIndex::kStopBeyondEnd) {
+      EXPECT_EQ(stop, findex.ItemFileSize());
+    }
+    CItems items(CColumnSet::FromGeneralFlags(findex.Header().GeneralFlags));
+    bool truncated = false;
+    findex.ReadItems(items, start, stop, 0, truncated);
+    MergeRuns(items);
+    Found found;
+    test::LookupFixture::Collect(items, found);
+    EXPECT_EQ(KeySet(found), c.keys);
+  }
+  // A findex without words has an empty tree.
+  CGiFIndex none(defs_);
+  none.Open("LkNone");
+  int64_t start = -1;
+  int64_t stop = -1;
+  EXPECT_EQ(none.FindStartStop(text("A"), text("Z"), start, stop, false, 0),
+            CGiFIndex::kNothingFound);
+}
+
 TEST_F(FindexLookupTest, WildcardsAndBackslashesMatchExactlyAsWritten) {
   // Blanks alone separate words here, so "*" and "?" stand inside words.
   ASSERT_EQ(command_->SetIndexGeneralOptions(VARIANT_FALSE, VARIANT_TRUE, VARIANT_FALSE, T(" "),

@@ -73,8 +73,9 @@ void CGiFIndex::Open(std::string_view name) {
 
 bool CGiFIndex::TryOpen(std::string_view name) {
   return Guarded("Open", [&] {
-    RequirePlainName<CGiFIndexException>("findex", name, "Open");
-    if (!platform::FileExists(findex::PathsOf(defs_, name).sdx)) {
+    // No findex can have such a name (an add-on of a findex whose name is
+    // already near the length limit, say): nothing to open, nothing touched.
+    if (!IsPlainName(name) || !platform::FileExists(findex::PathsOf(defs_, name).sdx)) {
       Close();
       return false;
     }

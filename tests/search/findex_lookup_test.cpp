@@ -340,6 +340,8 @@ TEST_F(FindexLookupTest, AddOnFindexesAddTheirRowsToTheLookup) {
   ASSERT_TRUE(add_on.TryOpen("LkAdd_ADD_1"));
   CGiFIndex missing(defs_);
   EXPECT_FALSE(missing.TryOpen("LkAdd_ADD_2"));
+  EXPECT_FALSE(missing.TryOpen(std::string(196, 'L') + "_ADD_1")) << "too long to exist";
+  EXPECT_THROW(missing.Open(std::string(200, 'L')), CGiFIndexException);
 
   struct AddCase {
     std::u16string word;

@@ -73,8 +73,9 @@ void CGiFIndex::Open(std::string_view name) {
 
 bool CGiFIndex::TryOpen(std::string_view name) {
   return Guarded("Open", [&] {
-    RequirePlainName<CGiFIndexException>("findex", name, "Open");
-    if (!platform::FileExists(findex::PathsOf(defs_, name).sdx)) {
+    // No findex can have such a name (an add-on of a findex whose name is
+    // already near the length limit, say): nothing to open, nothing touched.
+    if (!IsPlainName(name) || !platform::FileExists(findex::PathsOf(defs_, name).sdx)) {
       Close();
       return false;
     }
@@ -175,7 +176,9 @@ int32_t CGiFIndex::Descend(const CValue& value) {
     } catch (const CException& e) {
       Damaged("Descend", "tree block " + std::to_string(number) + " cannot be read", &e);
     }
-    if (child <= number || child >= block_count_) {
+    // A node written after a split comes after its first child, so only the
+    // range is checked; the descent has its fixed number of levels.
+    if (child < 2 || child == number || child >= block_count_) {
       Damaged("Descend", "tree block " + std::to_string(number) + " points to block " +
                              std::to_string(child));
     }

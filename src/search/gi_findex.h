@@ -66,8 +66,8 @@ class CGiFIndex {
   // Opens name (a plain name, else refused before any file is touched): the
   // .sdx read-only, its header read and checked (version, block count).
   void Open(std::string_view name);
-  // As Open, but false (nothing open) when the findex's .sdx does not exist:
-  // the end of the add-on findexes.
+  // As Open, but false (nothing open) when the findex's .sdx does not exist
+  // or the name is no plain name: the end of the add-on findexes.
   bool TryOpen(std::string_view name);
   void Close();
   bool IsOpen() const { return open_; }

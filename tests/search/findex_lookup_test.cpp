@@ -8,6 +8,11 @@
 #include <string>
 #include <vector>
 
+#include "config/global_defs.h"
+#include "format/bfile.h"
+#include "format/findex_postings.h"
+#include "format/findex_tree.h"
+#include "format/index_header.h"
 #include "search/lookup_fixture.h"
 
 namespace qm {
@@ -91,6 +96,58 @@ TEST_F(FindexLookupTest, TextWordsRangesPatternsAndSimilarWords) {
     EXPECT_EQ(found.found, !c.keys.empty());
     EXPECT_TRUE(std::is_sorted(found.keys.begin(), found.keys.end()));
   }
+}
+
+TEST_F(FindexLookupTest, StartAndStopPositionsBoundTheRunsOfTheWordsInARange) {
+  Build("LkSpan", "varchar(40)", kTextRows);
+  Build("LkNone", "varchar(40)", {"1, NULL"});
+  CGiFIndex findex(defs_);
+  findex.Open("LkSpan");
+  const auto text = [](const char* utf8) {
+    CValue value;
+    value.SetText(utf8);
+    return value;
+  };
+  struct SpanCase {
+    const char* start;
+    const char* stop;
+    bool single;
+    int32_t result;
+    std::set<int32_t> keys;  // of the rows between the two positions
+  };
+  const std::vector<SpanCase> cases = {
+      {"FISH", "FISH", true, CGiFIndex::kFound, {7}},
+      {"FISHX", "FISHX", true, CGiFIndex::kNothingFound, {}},
+      {"B", "BAND", false, CGiFIndex::kFound, {4, 5}},
+      {"BANDANA", "FISHES", false, CGiFIndex::kFound, {6, 7, 9, 12}},
+      {"FISHZ", "\xC3\xBF", false, CGiFIndex::kStopBeyondEnd, {11}},
+      {"C", "D", false, CGiFIndex::kNothingFound, {}},
+  };
+  for (const SpanCase& c : cases) {
+    SCOPED_TRACE(std::string(c.start) + ".." + c.stop);
+    int64_t start = -1;
+    int64_t stop = -1;
+    EXPECT_EQ(findex.FindStartStop(text(c.start), text(c.stop), start, stop, c.single, 0),
+              c.result);
+    if (c.result == CGiFIndex::kNothingFound) continue;
+    if (c.result == CGiFIndex::kStopBeyondEnd) {
+      EXPECT_EQ(stop, findex.ItemFileSize());
+    }
+    CItems items(CColumnSet::FromGeneralFlags(findex.Header().GeneralFlags));
+    bool truncated = false;
+    findex.ReadItems(items, start, stop, 0, truncated);
+    MergeRuns(items);
+    Found found;
+    test::LookupFixture::Collect(items, found);
+    EXPECT_EQ(KeySet(found), c.keys);
+  }
+  // A findex without words has an empty tree.
+  CGiFIndex none(defs_);
+  none.Open("LkNone");
+  int64_t start = -1;
+  int64_t stop = -1;
+  EXPECT_EQ(none.FindStartStop(text("A"), text("Z"), start, stop, false, 0),
+            CGiFIndex::kNothingFound);
 }
 
 TEST_F(FindexLookupTest, WildcardsAndBackslashesMatchExactlyAsWritten) {
@@ -283,6 +340,8 @@ TEST_F(FindexLookupTest, AddOnFindexesAddTheirRowsToTheLookup) {
   ASSERT_TRUE(add_on.TryOpen("LkAdd_ADD_1"));
   CGiFIndex missing(defs_);
   EXPECT_FALSE(missing.TryOpen("LkAdd_ADD_2"));
+  EXPECT_FALSE(missing.TryOpen(std::string(196, 'L') + "_ADD_1")) << "too long to exist";
+  EXPECT_THROW(missing.Open(std::string(200, 'L')), CGiFIndexException);
 
   struct AddCase {
     std::u16string word;
@@ -333,6 +392,62 @@ TEST_F(FindexLookupTest, WordListsFollowTheFilterFromItsPrefix) {
     EXPECT_EQ(words, c.words);
     EXPECT_EQ(total, c.total);
   }
+}
+
+// Words of 600 bytes: a few to a block, so the tree has many nodes on every
+// level, and nodes split after their first children were numbered.
+TEST_F(FindexLookupTest, EveryWordOfATreeWithManyNodesOnEveryLevelIsFound) {
+  const std::string pad(600, 'x');
+  const auto word = [&](int w) {
+    std::string n = std::to_string(w);
+    return "W" + std::string(4 - n.size(), '0') + n + pad;
+  };
+  constexpr int kWords = 1000;
+  {
+    BFile tree;
+    tree.OpenFile(IndexFolder() + "LKWIDE.sdx", BFile::kCreate, CFindexTreeWriter::kBlockUnits);
+    CFindexTreeWriter writer(tree, CFindexTreeWriter::kMaxBlockNumber);
+    CFindexPostingWriter postings(CColumnSet::FromGeneralFlags(2),
+                                  CFindexPostingWriter::kMaxFileBytes);
+    postings.Create(IndexFolder() + "LKWIDE.fst");
+    for (int w = 0; w < kWords; ++w) {
+      CValue value;
+      value.SetText(word(w));
+      writer.AddWord(value, postings.BeginList());
+      const int32_t row[2] = {w + 1, 1};
+      postings.AddEntry(row);
+      postings.EndList();
+    }
+    CIndexHeader header;
+    header.BlockNum = writer.Finish();
+    header.FindexType = 2;
+    header.GeneralFlags = 2;
+    header.WriteInfo(tree);
+    tree.Close();
+    postings.Close();
+  }
+  CGiFIndex findex(defs_);
+  findex.Open("LkWide");
+  ASSERT_GT(findex.Header().BlockNum, 150) << "a tree of many nodes";
+  const auto keys = [&](const std::string& text, int32_t flags) {
+    CItems items(CColumnSet::FromGeneralFlags(2));
+    findex.GetItems(items, CWordSearch::ForText(Utf8ToUtf16(text), 2), flags, -1, 0, false);
+    MergeRuns(items);
+    Found found;
+    test::LookupFixture::Collect(items, found);
+    return found.keys;
+  };
+  for (int w = 0; w < kWords; ++w) {
+    ASSERT_EQ(keys(word(w), 0), std::vector<int32_t>{w + 1}) << w;
+  }
+  std::vector<int32_t> above_500;
+  for (int32_t k = 502; k <= kWords; ++k) above_500.push_back(k);
+  EXPECT_EQ(keys(word(500), kGreater), above_500);
+  EXPECT_EQ(keys(word(500).substr(0, 5) + "y", kGreater), above_500) << "between two words";
+  std::vector<int32_t> ninth_hundred;
+  for (int32_t k = 901; k <= 1000; ++k) ninth_hundred.push_back(k);
+  EXPECT_EQ(keys("W09*", 0), ninth_hundred);
+  EXPECT_EQ(keys("W1000", 0), std::vector<int32_t>{});
 }
 
 }  // namespace

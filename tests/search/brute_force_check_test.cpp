@@ -133,7 +133,7 @@ TEST_F(BruteForceCheckTest, RandomConditionsFindTheRowsAScanFinds) {
     };
     for (const Query& q : queries) {
       SCOPED_TRACE(q.condition);
-      const test::Found found = Search(q.condition);
+      const test::SearchOutcome found = Search(q.condition);
       ASSERT_EQ(found.error, "");
       EXPECT_EQ(found.keys, q.expected);
       ++checked;

@@ -245,8 +245,8 @@ TEST_F(ResultMergeTest, ReduceItemsKeepsTheLastRowOfEachKey) {
 TEST_F(ResultMergeTest, KeyedMergesOfAnUnreducedConditionEqualReducingItFirst) {
   const CItems left = Result(Set(1, 1), {{1, 10, 3}, {4, 20, 1}, {6, 30, 2}, {9, 40, 7}});
   // Keys 4 and 9 with several rows; 2 and 7 never met by the left side.
-  const CItems raw = Result(Set(1, 1), {{2, 1, 1}, {4, 5, 1}, {4, 9, 6}, {7, 3, 2}, {9, 2, 4},
-                                        {9, 8, 5}, {9, 1, 9}});
+  const CItems raw = Result(
+      Set(1, 1), {{2, 1, 1}, {4, 5, 1}, {4, 9, 6}, {7, 3, 2}, {9, 2, 4}, {9, 8, 5}, {9, 1, 9}});
   for (const int32_t words : {1, 2}) {
     CItems reduced = Result(Set(1, 1), RowsOf(raw));
     rowset_.ReduceItems(reduced, words);

@@ -89,7 +89,7 @@ TEST_F(SearchEvaluationTest, OperatorsModifiersAndPatternsFindTheRowsTheyDescrib
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.condition);
-    const test::Found found = Search(c.condition);
+    const test::SearchOutcome found = Search(c.condition);
     EXPECT_EQ(found.error, "");
     EXPECT_EQ(found.keys, c.keys);
     EXPECT_EQ(found.total, static_cast<int32_t>(c.keys.size()));
@@ -99,7 +99,7 @@ TEST_F(SearchEvaluationTest, OperatorsModifiersAndPatternsFindTheRowsTheyDescrib
 
 TEST_F(SearchEvaluationTest, ProximityFindsEitherWordAndRanksCloseWordsHigher) {
   BuildWines();
-  const test::Found found = Search("WINES=|'red wine'");
+  const test::SearchOutcome found = Search("WINES=|'red wine'");
   ASSERT_EQ(found.error, "");
   EXPECT_EQ(found.keys, (KeyList{1, 2, 3, 4, 5, 10, 11}));
   const auto score = [&](int32_t key) {
@@ -156,7 +156,7 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.condition);
-    const test::Found found = Search(c.condition);
+    const test::SearchOutcome found = Search(c.condition);
     EXPECT_NE(found.error.find(c.error), std::string::npos) << found.error;
     if (*c.error == '\0') {
       EXPECT_EQ(found.error, "");
@@ -334,17 +334,17 @@ TEST_F(SearchEvaluationTest, CacheSizeCutsReadsAndMergesAndSaysSo) {
   Options(true, true);  // rows of 12 bytes: key, score, position
   ASSERT_EQ(Run("CREATE FINDEX Counts ON TABLE counts COLUMNS body KEY id"), "");
 
-  const test::Found whole = Search("COUNTS='alpha' OR COUNTS='beta'");
+  const test::SearchOutcome whole = Search("COUNTS='alpha' OR COUNTS='beta'");
   EXPECT_EQ(whole.total, 40);
   EXPECT_FALSE(whole.truncated);
   // Ten row widths: 9 rows and the count row.
-  const test::Found cut = Search("COUNTS='alpha' OR COUNTS='beta'", 10 * 12);
+  const test::SearchOutcome cut = Search("COUNTS='alpha' OR COUNTS='beta'", 10 * 12);
   EXPECT_EQ(cut.keys, (KeyList{1, 2, 3, 4, 5, 6, 7, 8, 9}));
   EXPECT_TRUE(cut.truncated);
-  const test::Found word = Search("COUNTS='alpha'", 10 * 12);
+  const test::SearchOutcome word = Search("COUNTS='alpha'", 10 * 12);
   EXPECT_TRUE(word.truncated);
   EXPECT_EQ(word.keys, (KeyList{1, 3, 5, 7, 9, 11, 13, 15, 17}));
-  const test::Found roomy = Search("COUNTS='alpha'", 21 * 12);
+  const test::SearchOutcome roomy = Search("COUNTS='alpha'", 21 * 12);
   EXPECT_FALSE(roomy.truncated);
   EXPECT_EQ(roomy.total, 20);
 }
@@ -392,9 +392,8 @@ TEST_F(SearchEvaluationTest, MissingFindexAndDamagedDeletedKeysAreErrors) {
   BuildWines();
   EXPECT_NE(Search("NOWHERE='wine'").error, "");
   test::WriteFile(IndexFolder() + "WINES.del", std::string("\x05\x00\x00\x00\x01\x00", 6));
-  const test::Found damaged = Search("WINES='wine'");
-  EXPECT_NE(damaged.error.find("Deleted-key file is damaged"), std::string::npos)
-      << damaged.error;
+  const test::SearchOutcome damaged = Search("WINES='wine'");
+  EXPECT_NE(damaged.error.find("Deleted-key file is damaged"), std::string::npos) << damaged.error;
   EXPECT_TRUE(damaged.keys.empty());
 }
 

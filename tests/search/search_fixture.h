@@ -20,7 +20,7 @@ namespace qm::test {
 
 // What one search found: keys in result order, their scores (when the
 // findex keeps them), and the result set's state.
-struct Found {
+struct SearchOutcome {
   std::vector<int32_t> keys;
   std::vector<int32_t> scores;
   int32_t total = 0;
@@ -47,11 +47,11 @@ class SearchFixture : public CommandFixture {
   }
 
   // Runs the condition (the text inside the brackets) on a fresh result set.
-  Found Search(const std::string& condition, int32_t cache_size = 0) {
+  SearchOutcome Search(const std::string& condition, int32_t cache_size = 0) {
     CGlobalDefs defs = Defs();
     CGiTreeRowset rowset(defs);
     rowset.SetCacheSize(cache_size);
-    Found found;
+    SearchOutcome found;
     try {
       rowset.Commands()
           .Add(std::make_unique<CGiCmdTree>(defs))
@@ -72,7 +72,7 @@ class SearchFixture : public CommandFixture {
   }
 
   std::vector<int32_t> Keys(const std::string& condition) {
-    const Found found = Search(condition);
+    const SearchOutcome found = Search(condition);
     EXPECT_EQ(found.error, "") << condition;
     return found.keys;
   }

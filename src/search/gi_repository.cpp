@@ -97,7 +97,8 @@ void CGiRepository::OpenRepository(std::string_view name) {
 void CGiRepository::OpenMember(const std::string& findex_name) {
   // The name is checked before the lock and the files are named after it.
   RequirePlainName<CGiRepositoryException>("findex", findex_name, "OpenRepository");
-  auto lock = std::make_unique<CLockManager>(defs_.GetGroup(), findex_name, kLockFindex);
+  auto lock = std::make_unique<CLockManager>(defs_.GetLockScope(), defs_.GetGroup(), findex_name,
+                                             kLockFindex);
   lock->LockReader();
   auto findex = std::make_unique<CGiFIndex>(defs_);
   findex->Open(findex_name);

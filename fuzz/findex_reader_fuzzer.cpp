@@ -33,6 +33,11 @@ using qm::fuzz::Require;
 namespace {
 
 struct Sound {
+  ~Sound() {
+    std::error_code ignored;
+    std::filesystem::remove_all(root, ignored);
+  }
+  std::string root;
   std::string folder;
   std::string sdx;
   std::string fst;
@@ -53,11 +58,13 @@ void Spill(const std::string& path, const std::string& bytes) {
 
 // Words W0000 .. W1199, each with a few postings (key, position).
 Sound& MakeSound() {
-  static Sound sound = [] {
-    Sound s;
+  static Sound sound;
+  static const bool made = [] {
+    Sound& s = sound;
     const std::string root =
         (std::filesystem::temp_directory_path() / ("qm_findex_fuzz_" + std::to_string(getpid())))
             .string() + "/";
+    s.root = root;
     s.folder = root + "Groups/PUBLIC/Indexes/";
     std::filesystem::create_directories(s.folder);
     s.defs.SetDataPath(root);
@@ -92,8 +99,9 @@ Sound& MakeSound() {
     postings.Close();
     s.sdx_bytes = Slurp(s.sdx);
     s.fst_bytes = Slurp(s.fst);
-    return s;
+    return true;
   }();
+  Require(made);
   return sound;
 }
 

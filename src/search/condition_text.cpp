@@ -18,13 +18,6 @@ bool IsDigit(char16_t c) { return c >= u'0' && c <= u'9'; }
 
 }  // namespace
 
-std::u16string_view TrimBlanks(std::u16string_view text) {
-  const auto first = text.find_first_not_of(kGiBlanks);
-  if (first == std::u16string_view::npos) return {};
-  const auto last = text.find_last_not_of(kGiBlanks);
-  return text.substr(first, last - first + 1);
-}
-
 std::u16string_view StripQuotes(std::u16string_view text) {
   if (text.size() >= 2 && text.front() == u'\'' && text.back() == u'\'') {
     return text.substr(1, text.size() - 2);

@@ -8,14 +8,14 @@
 #include <string>
 #include <string_view>
 
+#include "text/blank_trim.h"
+
 namespace qm {
 
 class CSeparatorSet;
 
-// Blanks, tabs, carriage returns and line feeds.
+// Blanks, tabs, carriage returns and line feeds: what TrimBlanks removes.
 inline constexpr std::u16string_view kGiBlanks = u" \t\r\n";
-
-std::u16string_view TrimBlanks(std::u16string_view text);
 
 // The text with every parenthesis, everything inside parentheses and every
 // quoted phrase (quotes included) replaced by 'x', so operators there are not

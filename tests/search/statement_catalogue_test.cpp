@@ -1,0 +1,99 @@
+// Search statements on findexes built from SQLite: values are read with the
+// findex's own separators, value type and stop words, and names that are not
+// findexes fail before anything is searched.
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <string>
+
+#include "api/command_fixture.h"
+#include "base/exception_family.h"
+#include "search/cmd_tree.h"
+#include "search/condition_shape.h"
+#include "support/raised_error.h"
+
+namespace qm {
+namespace {
+
+class StatementCatalogueTest : public test::CommandFixture {
+ protected:
+  void SetUp() override {
+    CommandFixture::SetUp();
+    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
+                          std::filesystem::copy_options::recursive);
+    UseSqlite();
+    defs_ = Defs();
+  }
+
+  void Build(const std::string& findex, const std::string& column_type, const std::string& row) {
+    const std::string table = "t_" + findex;
+    Sql({"create table " + table + " (id integer, v " + column_type + ")",
+         "insert into " + table + " values (1, " + row + ")"});
+    ASSERT_EQ(Run("CREATE FINDEX " + findex + " ON TABLE " + table + " COLUMNS v KEY id"), "");
+  }
+
+  std::string ShapeOf(const std::string& condition) {
+    CGiCmdTree command(defs_);
+    command.SplitSqlW(Utf8ToUtf16("SELECT id FROM t WHERE [" + condition + "]"));
+    return test::Shape(command.Root());
+  }
+
+  CGlobalDefs defs_;
+};
+
+TEST_F(StatementCatalogueTest, ValuesFollowTheFindexTheyName) {
+  // English stop words on.
+  ASSERT_EQ(command_->SetIndexLanguageOptions(2, VARIANT_FALSE, VARIANT_FALSE, VARIANT_TRUE,
+                                              VARIANT_FALSE, VARIANT_FALSE),
+            S_OK);
+  Build("Stopped", "varchar(100)", "'the river of life'");
+  ASSERT_EQ(command_->SetIndexLanguageOptions(2, VARIANT_FALSE, VARIANT_FALSE, VARIANT_FALSE,
+                                              VARIANT_FALSE, VARIANT_FALSE),
+            S_OK);
+  Build("Kept", "varchar(100)", "'the river of life'");
+  Build("Years", "integer", "1999");
+  // Blanks alone separate words.
+  ASSERT_EQ(command_->SetIndexGeneralOptions(VARIANT_FALSE, VARIANT_TRUE, VARIANT_FALSE, T(" "),
+                                             VARIANT_FALSE, VARIANT_FALSE),
+            S_OK);
+  Build("Spaced", "varchar(100)", "'red-wine'");
+
+  struct Case {
+    const char* condition;
+    const char* shape;
+  };
+  const Case cases[] = {
+      {"STOPPED='the river of life'", "STOPPED{ADJ(RIVER,LIFE)}"},
+      {"KEPT='the river'", "KEPT{ADJ(THE,RIVER)}"},
+      {"KEPT='red-wine'", "KEPT{ADJ(RED,WINE)}"},
+      {"SPACED='red-wine'", "SPACED{RED-WINE}"},
+      {"YEARS='1999' OR '2001'", "YEARS{OR(1999,2001)}"},
+      {"KEPT='river' AND YEARS!='1999'", "ANDNOT(KEPT{RIVER},YEARS{1999})"},
+      {"YEARS!='1999' AND KEPT='river'", "AND(FILTERNOT(YEARS{*},YEARS{1999}),KEPT{RIVER})"},
+  };
+  for (const Case& c : cases) {
+    EXPECT_EQ(ShapeOf(c.condition), c.shape) << c.condition;
+  }
+}
+
+TEST_F(StatementCatalogueTest, NamesThatAreNoFindexFail) {
+  Build("Kept", "varchar(100)", "'river'");
+  CGiCmdTree command(defs_);
+  try {
+    command.SplitSqlW(u"SELECT id FROM t WHERE [KEPT='river' OR NOSUCH='x']");
+    FAIL() << "a name that is no findex was accepted";
+  } catch (const CGiCmdTreeException& e) {
+    ASSERT_GE(e.GetEntries().size(), 2u);
+    EXPECT_EQ(Utf16ToUtf8(e.GetEntries().front().text),
+              "General Error (Module:GiCmdTree,Method:StartBuildTreeW)");
+    EXPECT_NE(Utf16ToUtf8(e.GetEntries()[1].text).find("GiRepository"), std::string::npos)
+        << Utf16ToUtf8(e.GetEntries()[1].text);
+  }
+  EXPECT_FALSE(command.IsParsed());
+  const auto raised = test::Raised<CGiCmdTreeException>(
+      [&] { command.SplitSqlW(u"SELECT id FROM t WHERE [..\\KEPT='x']"); });
+  EXPECT_EQ(raised.text.rfind("Invalid findex name", 0), 0u) << raised.text;
+}
+
+}  // namespace
+}  // namespace qm

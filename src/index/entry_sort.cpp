@@ -27,6 +27,8 @@ constexpr int32_t kAllocationFailed = 11;
 constexpr int64_t kProgressStep = 4096;
 // Room for several of the longest entries a layout can hold (64 KB each).
 constexpr std::size_t kLeastBufferBytes = 256 * 1024;
+// A run buffer is sorted in about this many pieces as it fills.
+constexpr std::size_t kPiecesPerBuffer = 16;
 
 using Clock = std::chrono::steady_clock;
 
@@ -101,6 +103,13 @@ void CEntrySort::Add(const uint8_t* entry, std::size_t size) {
   *SlotsBegin() = Slot{0, fill_};
   fill_ += size;
   ++entries_;
+  // Pieces are sorted as they fill, while the rows are still being read; the
+  // run is merged from them when it is written.
+  if (fill_ - piece_fill_ >= PieceBytes()) SortPiece();
+}
+
+std::size_t CEntrySort::PieceBytes() const {
+  return std::max(buffer_bytes_ / kPiecesPerBuffer, kLeastBufferBytes / 4);
 }
 
 void CEntrySort::AddEntries(const uint8_t* entries, std::size_t bytes) {
@@ -111,10 +120,20 @@ void CEntrySort::AddEntries(const uint8_t* entries, std::size_t bytes) {
   }
 }
 
-void CEntrySort::SortBuffer() {
+CEntrySort::Slot* CEntrySort::SlotAt(std::size_t index) const {
+  // Slot index i (in the order added) lies i + 1 slots below the end.
+  return std::launder(reinterpret_cast<Slot*>(buffer_.get() + buffer_bytes_ -
+                                              (index + 1) * sizeof(Slot)));
+}
+
+void CEntrySort::SortPiece() {
+  const std::size_t first = pieces_.empty() ? 0 : pieces_.back();
+  if (slots_ == first) return;
+  const Clock::time_point start = Clock::now();
   const auto* base = reinterpret_cast<const uint8_t*>(buffer_.get());
-  Slot* begin = SlotsBegin();
-  Slot* end = begin + slots_;
+  // Slots first..slots_ - 1 lie from SlotAt(slots_ - 1) upwards.
+  Slot* begin = SlotAt(slots_ - 1);
+  Slot* end = begin + (slots_ - first);
   layout_.WithComparison([&](auto compare) {
     for (Slot* s = begin; s != end; ++s) s->prefix = compare.Prefix(base + s->offset);
     // Equal entries by offset, that is in the order they were added.
@@ -124,56 +143,52 @@ void CEntrySort::SortBuffer() {
       return c != 0 ? c < 0 : a.offset < b.offset;
     });
   });
+  pieces_.push_back(slots_);
+  piece_fill_ = fill_;
   if (entries_ - traced_ >= kSortedTraceStep) {
     traced_ = entries_;
     Trace(defs_.TraceLevel2(), TraceTag(), "Words Sorted: %i", entries_);
   }
-}
-
-void CEntrySort::WriteBuffer(SortFileWriter& out) const {
-  const auto* base = reinterpret_cast<const uint8_t*>(buffer_.get());
-  const Slot* begin = SlotsBegin();
-  for (const Slot* s = begin; s != begin + slots_; ++s) {
-    out.Put(base + s->offset, layout_.SizeOf(base + s->offset));
-  }
-}
-
-void CEntrySort::ClearBuffer() { fill_ = slots_ = 0; }
-
-void CEntrySort::SpillRun() {
-  const Clock::time_point start = Clock::now();
-  SortBuffer();
-  if (!run_file_.IsOpen()) OpenSortFile(defs_, run_file_);
-  const int64_t begin = runs_in_file_.empty() ? 0 : runs_in_file_.back().begin + runs_in_file_.back().bytes;
-  SortFileWriter writer;
-  writer.Start(run_file_);
-  WriteBuffer(writer);
-  writer.Finish();
-  runs_in_file_.push_back(Run{begin, static_cast<int64_t>(fill_)});
-  ++runs_;
-  ClearBuffer();
   run_seconds_ += SecondsSince(start);
 }
 
-// The k-way merge of runs: inputs are runs in a file and, last, the sorted
-// buffer; a heap picks the smallest entry, the lower input first among equals.
+std::vector<CEntrySort::SlotRange> CEntrySort::SortedPieces() {
+  SortPiece();
+  std::vector<SlotRange> ranges;
+  std::size_t first = 0;
+  for (const std::size_t last : pieces_) {
+    if (last > first) ranges.push_back(SlotRange{SlotAt(last - 1), SlotAt(last - 1) + (last - first)});
+    first = last;
+  }
+  return ranges;
+}
+
+void CEntrySort::ClearBuffer() {
+  fill_ = slots_ = piece_fill_ = 0;
+  pieces_.clear();
+}
+
+// The k-way merge of runs: inputs are runs in a file and, after them, the
+// sorted pieces of the buffer; a heap picks the smallest entry, the lower
+// input first among equals. With work 0 it shows no progress.
 class CEntrySort::Merger {
  public:
-  Merger(CEntrySort& sort, int64_t work) : sort_(sort), work_(std::max<int64_t>(work, 1)) {}
+  Merger(CEntrySort& sort, int64_t work) : sort_(sort), work_(work) {}
 
-  // Merges runs (and the buffer when with_buffer) into out; returns the bytes written.
-  int64_t Run(MFile& file, const std::vector<CEntrySort::Run>& runs, bool with_buffer,
-              MFile& out) {
+  // Merges runs of file and pieces into out (from its current end); returns
+  // the bytes written.
+  int64_t Run(MFile& file, const std::vector<CEntrySort::Run>& runs,
+              const std::vector<SlotRange>& pieces, MFile& out) {
     inputs_.clear();
     inputs_.reserve(runs.size() + 1);
     for (const CEntrySort::Run& run : runs) {
       inputs_.emplace_back(sort_.layout_);
       inputs_.back().reader.Start(file, run.begin, run.bytes);
     }
-    if (with_buffer) {
+    for (const SlotRange& piece : pieces) {
       inputs_.emplace_back(sort_.layout_);
-      inputs_.back().slot = sort_.SlotsBegin();
-      inputs_.back().slot_end = inputs_.back().slot + sort_.slots_;
+      inputs_.back().slot = piece.begin;
+      inputs_.back().slot_end = piece.end;
     }
     SortFileWriter writer;
     writer.Start(out);
@@ -199,7 +214,7 @@ class CEntrySort::Merger {
         } else {
           heap.pop_back();
         }
-        if (++merged_ % kProgressStep == 0) ShowProgress();
+        if (++merged_ % kProgressStep == 0 && work_ > 0) ShowProgress();
       }
     });
     writer.Finish();
@@ -240,6 +255,19 @@ class CEntrySort::Merger {
   std::vector<Input> inputs_;
 };
 
+void CEntrySort::SpillRun() {
+  const Clock::time_point start = Clock::now();
+  const std::vector<SlotRange> pieces = SortedPieces();
+  if (!run_file_.IsOpen()) OpenSortFile(defs_, run_file_);
+  const int64_t begin =
+      runs_in_file_.empty() ? 0 : runs_in_file_.back().begin + runs_in_file_.back().bytes;
+  Merger merge(*this, 0);
+  runs_in_file_.push_back(Run{begin, merge.Run(run_file_, {}, pieces, run_file_)});
+  ++runs_;
+  ClearBuffer();
+  run_seconds_ += SecondsSince(start);
+}
+
 void CEntrySort::Finish(MFile& sorted) {
   try {
     Merge(sorted);
@@ -253,11 +281,8 @@ void CEntrySort::Merge(MFile& sorted) {
   // The last run stays in memory and joins the final merge as its last input,
   // unless passes before it must merge groups of runs first.
   const bool intermediate = runs_in_file_.size() + (slots_ > 0 ? 1 : 0) > merge_ways_;
-  if (intermediate && slots_ > 0) {
-    SpillRun();
-  } else if (slots_ > 0) {
-    SortBuffer();
-  }
+  if (intermediate && slots_ > 0) SpillRun();
+  const std::vector<SlotRange> pieces = SortedPieces();
   if (slots_ > 0) ++runs_;
   int64_t passes = 1;
   for (std::size_t n = runs_in_file_.size(); n > merge_ways_; n = (n + merge_ways_ - 1) / merge_ways_) {
@@ -274,7 +299,7 @@ void CEntrySort::Merge(MFile& sorted) {
       const std::vector<Run> group(runs_in_file_.begin() + static_cast<std::ptrdiff_t>(first),
                                    runs_in_file_.begin() + static_cast<std::ptrdiff_t>(last));
       const int64_t begin = merged.empty() ? 0 : merged.back().begin + merged.back().bytes;
-      merged.push_back(Run{begin, merge.Run(run_file_, group, false, next)});
+      merged.push_back(Run{begin, merge.Run(run_file_, group, {}, next)});
     }
     ++passes_;
     Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i",
@@ -283,7 +308,7 @@ void CEntrySort::Merge(MFile& sorted) {
     runs_in_file_ = std::move(merged);
   }
   OpenSortFile(defs_, sorted);
-  merge.Run(run_file_, runs_in_file_, slots_ > 0, sorted);
+  merge.Run(run_file_, runs_in_file_, pieces, sorted);
   ++passes_;
   Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i", int64_t{1});
   buffer_.reset();

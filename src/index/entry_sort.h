@@ -1,7 +1,8 @@
 // CEntrySort: the external sort of index entries (sort_entry.h), shared by the
 // word sort and the order sort. Memory-bounded: entries are gathered in one
-// buffer of the memory budget; a full buffer is sorted in place and written
-// as a run. At the end the runs (and the last one, still in memory) are
+// buffer of the memory budget and sorted in place in pieces as it fills (so
+// sorting keeps pace with a producer on another thread); a full buffer is
+// merged from its pieces and written as a run. At the end the runs (and the last one, still in memory) are
 // merged k ways at a time, so each entry is written and read about twice
 // however large the input. Only when more than kMergeWays runs exist does a
 // pass merge groups of them into longer runs first.
@@ -96,13 +97,23 @@ class CEntrySort {
 
   void Merge(MFile& sorted);
 
+  // A sorted piece of the buffer's slots.
+  struct SlotRange {
+    const Slot* begin;
+    const Slot* end;
+  };
+
   void Allocate();
   [[noreturn]] void RaiseAllocationFailure();
-  // Sorts the slots of the buffer by entry, then offset.
-  void SortBuffer();
-  // Sorts the buffer and writes it as one run to the run file.
+  // The slot of the index-th entry added to the buffer.
+  Slot* SlotAt(std::size_t index) const;
+  std::size_t PieceBytes() const;
+  // Sorts the slots added since the last piece by entry, then offset.
+  void SortPiece();
+  // Every piece of the buffer, sorted, the earliest first.
+  std::vector<SlotRange> SortedPieces();
+  // Merges the pieces of the buffer into one run of the run file.
   void SpillRun();
-  void WriteBuffer(SortFileWriter& out) const;
   void ClearBuffer();
   Slot* SlotsBegin() const;
   const char* TraceTag() const;
@@ -115,6 +126,8 @@ class CEntrySort {
   std::unique_ptr<std::byte[]> buffer_;
   std::size_t fill_ = 0;   // entry bytes at the start of buffer_
   std::size_t slots_ = 0;  // slots at the end of buffer_
+  std::vector<std::size_t> pieces_;  // the slot counts at which pieces end
+  std::size_t piece_fill_ = 0;       // fill_ when the last piece ended
   MFile run_file_;
   std::vector<Run> runs_in_file_;
   int64_t entries_ = 0;

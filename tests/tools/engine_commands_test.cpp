@@ -142,6 +142,7 @@ TEST_F(EngineCommandsTest, ExecCountsTheTextValuesCutAtTheLimit) {
   const std::string connect =
       Books({"create table books (id integer, body text)",
              "insert into books values (1, 'short'), (2, '" + body + "'), (3, '" + body + "')"});
+  ASSERT_EQ(Host({"init"}).status, 0);  // the language data the build needs
   setenv("MORVIL_MAX_COLUMN_TEXT_MB", "1", 1);
   const Result cut = Host({"--connect", connect, "exec",
                            "CREATE FINDEX Books ON TABLE books COLUMNS body KEY id"});

@@ -1,5 +1,6 @@
 #include "command/findex_column_parser.h"
 
+#include "base/error_numbers.h"
 #include "command/quoted_text.h"
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
@@ -8,7 +9,6 @@ namespace qm {
 
 namespace {
 
-constexpr int32_t kColumnListRejected = 17;
 
 std::string CleanName(std::u16string_view text) {
   return Utf16ToUtf8(UnquoteValue(TrimSpaces(text)));
@@ -17,7 +17,7 @@ std::string CleanName(std::u16string_view text) {
 }  // namespace
 
 void ParseFindexColumns(std::u16string_view columns, ColumnMap& column_map, const char* method) {
-  auto reject = [method] { return CPiCmdException::Numbered(kColumnListRejected, method, nullptr); };
+  auto reject = [method] { return CPiCmdException::Numbered(kErrColumnList, method, nullptr); };
   ColumnMap parsed = Guard<CPiCmdException, CPiCmdUnknownException>("InsertIndexTags", [&] {
     ColumnMap result;
     bool unterminated = false;

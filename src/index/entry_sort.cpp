@@ -3,26 +3,23 @@
 #include <algorithm>
 #include <chrono>
 #include <cstring>
-#include <filesystem>
 #include <new>
 #include <string>
-#include <system_error>
 
 #include "base/checked_allocation.h"
+#include "base/error_numbers.h"
 #include "base/exception_family.h"
 #include "base/trace.h"
 #include "config/global_defs.h"
 #include "config/megabyte_setting.h"
 #include "config/temp_names.h"
 #include "format/sort_stream.h"
+#include "platform/file_io.h"
 
 namespace qm {
 
 namespace {
 
-// The caller number in the temporary names of the sort files.
-constexpr int32_t kSortFileCaller = 44;
-constexpr int32_t kAllocationFailed = 11;
 // Entries between looks at the clock of progress while merging.
 constexpr int64_t kProgressStep = 4096;
 // Room for several of the longest entries a layout can hold (64 KB each).
@@ -64,9 +61,9 @@ void CEntrySort::RaiseAllocationFailure() {
   buffer_.reset();
   fill_ = slots_ = 0;
   if (module_ == Module::PiSort) {
-    throw CPiSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+    throw CPiSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
   }
-  throw CPiOrderSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+  throw CPiOrderSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
 }
 
 void CEntrySort::Allocate() {
@@ -80,13 +77,12 @@ void CEntrySort::Allocate() {
 }
 
 void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
-  const std::string path = SLGetTempWorkFilePath(defs, kSortFileCaller);
+  const std::string path = SLGetTempWorkFilePath(defs, kTempCallerSortRuns);
   try {
     file.OpenFile(path, MFile::kCreate, platform::kFileAttributeDeleteOnClose);
   } catch (...) {
     // The name was created for us; without an open file nothing else removes it.
-    std::error_code ignored;
-    std::filesystem::remove(path, ignored);
+    platform::UnlinkFile(path);  // best effort: the file may be gone already
     throw;
   }
 }

@@ -1,5 +1,6 @@
 #include "index/findex_writer.h"
 
+#include "base/error_numbers.h"
 #include "index/findex_file_set.h"
 #include "index/findex_files_writer.h"
 #include "index/word_sort.h"
@@ -16,7 +17,6 @@ namespace {
 
 constexpr const char* kTraceTag = "PILIB.PiFIndex.BuildRowFindex";
 constexpr int32_t kModeRead = 3;
-constexpr int32_t kTempCaller = 5;
 // Names are taken until one is free; the generator's lock makes them unique
 // between builds, so only files left behind by a crash can be in the way.
 constexpr int kTempNameAttempts = 100;
@@ -50,7 +50,7 @@ void CPiFIndex::Open(std::string_view name, int32_t mode) {
     if (mode == kModeBuild) {
       const std::string folder = defs_.GetFullDataPath(FolderKind::Indexes);
       for (int attempt = 1;; ++attempt) {
-        const std::string base = folder + SLGetTempFileName(defs_, true, kTempCaller);
+        const std::string base = folder + SLGetTempFileName(defs_, true, kTempCallerFindexFiles);
         if (!platform::FileExists(base + ".tmp1") && !platform::FileExists(base + ".tmp2")) {
           state_->temp_sdx = base + ".tmp1";
           state_->temp_fst = base + ".tmp2";
@@ -166,7 +166,7 @@ void CPiFIndex::DropFindex() {
   Guarded("DropFindex", [&] {
     if (state_->mode == 0) throw CPiFIndexException::General("DropFindex");
     if (findex::IsAddOnName(state_->name))
-      throw CPiFIndexException::Numbered(44, "DropFindex", nullptr);
+      throw CPiFIndexException::Numbered(kErrDropAddOn, "DropFindex", nullptr);
     const std::string name = state_->name;
     Close();
     findex::DropFiles(defs_, name);

@@ -21,7 +21,6 @@ namespace {
 
 constexpr const char* kRenameMethod = "RenameOrder2";
 constexpr const char* kErrorTag = "PILIB_ERROR.PiOrder.RenameOrder2";
-constexpr int32_t kTempCaller = 6;
 // The generator makes names unique between builds: only files left behind
 // by a crash can be in the way of one.
 constexpr int kTempNameAttempts = 100;
@@ -61,7 +60,7 @@ void CheckNames(const COrderInfo& definition, const char* method) {
 }
 
 COrderInfo ReadInfoShared(const CGlobalDefs& defs, std::string_view name) {
-  CLockManager lock(defs.GetGroup(), name, kLockOrder);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockOrder);
   lock.LockReader();
   BFile file;
   file.OpenFile(PathsOf(defs, name).sri, BFile::kReadOnly, kBlockUnits);
@@ -112,7 +111,7 @@ BuildFiles::BuildFiles(const CGlobalDefs& defs, std::size_t columns) {
   const std::string folder = OrderFolder(defs);
   std::string base;
   for (int attempt = 1;; ++attempt) {
-    base = folder + SLGetTempFileName(defs, true, kTempCaller);
+    base = folder + SLGetTempFileName(defs, true, kTempCallerOrderFiles);
     platform::FileHandle file = platform::OpenFileAs(base + ".sri.tmp", platform::FileAccess::Write,
                                                      platform::FileDisposition::CreateNew);
     if (file.IsOpen()) break;
@@ -148,7 +147,7 @@ void BuildFiles::MoveIntoPlace(const CGlobalDefs& defs, std::string_view name,
   moves.emplace_back(srt_, target.srt);
   moves.emplace_back(sri_, target.sri);
 
-  CLockManager lock(defs.GetGroup(), name, kLockOrder);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockOrder);
   file_swap::LockExclusively<CPiOrderException>(lock, "order", ToUpper(name), kRenameMethod,
                                                 kErrorTag);
   // Each old file goes aside just before its new one comes in.

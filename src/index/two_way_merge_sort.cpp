@@ -4,12 +4,12 @@
 
 #include <algorithm>
 #include <cstring>
-#include <filesystem>
 #include <new>
 #include <system_error>
 
 #include "format/sort_stream.h"
 #include "base/checked_allocation.h"
+#include "base/error_numbers.h"
 #include "base/exception_family.h"
 #include "config/global_defs.h"
 #include "config/temp_names.h"
@@ -19,7 +19,6 @@ namespace qm {
 
 namespace {
 
-constexpr int32_t kAllocationFailed = 11;
 // Room reserved per array entry at first; the arena grows past it for long text.
 constexpr std::size_t kFirstBytesPerEntry = 32;
 
@@ -35,9 +34,9 @@ const char* CTwoWayMergeSort::TraceTag() const {
 void CTwoWayMergeSort::RaiseAllocationFailure() {
   FreeRowArrays();
   if (module_ == Module::PiSort) {
-    throw CPiSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+    throw CPiSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
   }
-  throw CPiOrderSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+  throw CPiOrderSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
 }
 
 void CTwoWayMergeSort::AllocateRowArrays() {

@@ -11,6 +11,7 @@
 #include <optional>
 #include <vector>
 
+#include "base/error_numbers.h"
 #include "index/document_column.h"
 #include "index/entry_sort.h"
 #include "index/entry_block_queue.h"
@@ -35,7 +36,6 @@ namespace {
 constexpr const char* kSortTag = "PILIB.PiSort.SortFindexTable";
 constexpr const char* kRowsTag = "PILIB.PiSort.WriteFindexRows";
 constexpr const char* kRowsMethod = "WriteFindexRows";
-constexpr int32_t kNoRowsSelected = 47;
 constexpr int64_t kRowTraceStep = 100000;
 constexpr std::size_t kDefaultColumnTextMb = 64;
 
@@ -221,6 +221,7 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
       database.CacheColumns();
     } catch (const CShareDatabaseWarning& warning) {
       Trace(true, kRowsTag,
+            // Text kept as written: callers match on it. Do not correct.
             "Fetching database rows interupted because of database warning (probably a harmless "
             "no rows available): %S",
             warning.GetCurrentEntry().text);
@@ -326,7 +327,7 @@ int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows
     if (rows == 0) {
       sorting->Abort();
       if (no_rows == NoRows::Allow) return rows;
-      throw CPiSortException::Numbered(kNoRowsSelected, "SortFindexTable", nullptr);
+      throw CPiSortException::Numbered(kErrFindexNoRows, "SortFindexTable", nullptr);
     }
     defs_.SetProgress(15);
     const Clock::time_point merge_start = Clock::now();

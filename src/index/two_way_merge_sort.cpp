@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cstring>
 #include <new>
-#include <system_error>
 
 #include "format/sort_stream.h"
 #include "base/checked_allocation.h"

@@ -13,16 +13,16 @@
 // corpus). Every build runs in a child process of its own, so its peak memory
 // (maximum resident set) and CPU time are its own. --phases builds the same
 // findex once more from its two halves, the word sort (CPiSort) and the
-// writer (CPiFIndex::BuildFromSorted), to time its phases: the row loop (to
-// progress 15: rows read, split and written as entries), level one (to 20:
-// the 8,192-entry arrays sorted into runs), the two-way merge passes, the
-// writer, and closing the sorted file.
+// writer (CPiFIndex::BuildFromSorted), to time its phases: the row loop (rows
+// read, split and handed to the sorting thread, which sorts and writes runs
+// beside it), the k-way merge after the row loop, the writer, and closing the
+// sorted file. The sort's memory budget is sort_memory_mb of the
+// configuration store (MORVIL_SORT_MEMORY_MB).
 #include <sqlite3.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -213,8 +213,9 @@ Report BuildFindex(const std::string& corpus) {
                            1e6}};
 }
 
-// The same findex from its two halves, each timed; the row loop and level
-// one are told apart by the progress the sort reports.
+// The same findex from its two halves, each timed: the word sort reports its
+// row loop (with runs sorted on the second thread beside it), the sorting
+// thread's own time on runs, and the merge after the row loop.
 Report BuildFindexByPhases(const std::string& corpus) {
   const DataRoot root;
   qm::CGlobalDefs defs;
@@ -226,38 +227,25 @@ Report BuildFindexByPhases(const std::string& corpus) {
   definition.KeyColumn = "id";
   definition.Columns = {{"title", {}}, {"body", {}}};
 
-  std::atomic<bool> done = false;
-  Clock::time_point at15{}, at20{};
-  std::thread watch([&] {
-    while (!done) {
-      const int32_t p = defs.GetProgress();
-      if (p >= 15 && at15 == Clock::time_point{}) at15 = Clock::now();
-      if (p >= 20 && at20 == Clock::time_point{}) at20 = Clock::now();
-      std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-  });
   Clock::time_point start, sorted_at, written_at, closed_at;
+  qm::CPiSort sort(defs);
   try {
     start = Clock::now();
     qm::MFile sorted;
-    qm::CPiSort(defs).SortFindexTable(definition, sorted);
+    sort.SortFindexTable(definition, sorted);
     sorted_at = Clock::now();
     qm::CPiFIndex(defs).BuildFromSorted(definition, sorted, true);
     written_at = Clock::now();
     sorted.Close();
     closed_at = Clock::now();
   } catch (const qm::CExceptionBase& e) {
-    done = true;
-    watch.join();
     throw std::runtime_error(e.GetFullTextUtf8(100));
   }
-  done = true;
-  watch.join();
-  if (at15 == Clock::time_point{}) at15 = sorted_at;
-  if (at20 == Clock::time_point{}) at20 = sorted_at;
-  return {{"rows_s", Seconds(at15 - start)},
-          {"level_one_s", Seconds(at20 - at15)},
-          {"merges_s", Seconds(sorted_at - at20)},
+  const qm::CPiSort::Phases& phases = sort.LastPhases();
+  return {{"rows_s", phases.row_loop},
+          {"runs_s", phases.runs},
+          {"run_count", static_cast<double>(phases.run_count)},
+          {"merges_s", phases.merge},
           {"writer_s", Seconds(written_at - sorted_at)},
           {"close_s", Seconds(closed_at - written_at)},
           {"total_s", Seconds(closed_at - start)},
@@ -366,10 +354,10 @@ int main(int argc, char** argv) {
         if (phases) {
           const Report p = InChild([&] { return BuildFindexByPhases(corpus); });
           std::printf(
-              "phases  %3d %8.2f %7.2f  row loop %.2f, level one %.2f, merge passes %.2f, "
-              "writer %.2f, closing %.2f s\n",
-              r, p.at("total_s"), p.at("cpu_s"), p.at("rows_s"), p.at("level_one_s"),
-              p.at("merges_s"), p.at("writer_s"), p.at("close_s"));
+              "phases  %3d %8.2f %7.2f %8.1f  row loop %.2f (runs beside it %.2f, %.0f runs), "
+              "merge %.2f, writer %.2f, closing %.2f s\n",
+              r, p.at("total_s"), p.at("cpu_s"), p.at("peak_mb"), p.at("rows_s"), p.at("runs_s"),
+              p.at("run_count"), p.at("merges_s"), p.at("writer_s"), p.at("close_s"));
           if (p.at("words") != q.at("words")) {
             throw std::runtime_error("the phase build wrote another number of words");
           }

@@ -16,9 +16,14 @@ namespace {
 }  // namespace
 
 void SortFileReader::Start(MFile& file) {
+  file.Seek(0);  // hands what is buffered for writing to the file first
+  Start(file, 0, file.FileSize(false));
+}
+
+void SortFileReader::Start(MFile& file, int64_t begin, int64_t length) {
   file_ = &file;
-  file.Seek(0);
-  remaining_ = file.FileSize(false);
+  next_ = begin;
+  remaining_ = length;
   begin_ = end_ = 0;
   if (buffer_.empty()) buffer_.resize(kPieceBytes);
 }
@@ -34,7 +39,9 @@ bool SortFileReader::Have(std::size_t n) {
   const auto want = static_cast<std::size_t>(
       std::min<int64_t>(remaining_, static_cast<int64_t>(buffer_.size() - end_)));
   if (want > 0) {
+    file_->Seek(next_);
     file_->mread(buffer_.data() + end_, want);
+    next_ += static_cast<int64_t>(want);
     end_ += want;
     remaining_ -= static_cast<int64_t>(want);
   }

@@ -22,6 +22,9 @@ class SortFileReader {
 
   // Reads file from its start to its end, which must hold whole entries.
   void Start(MFile& file);
+  // Reads the bytes [begin, begin + length) of file, whole entries. Several
+  // readers may share one file: each seeks to its own place before it reads.
+  void Start(MFile& file, int64_t begin, int64_t length);
   // The next entry and its size, valid until the next call; null at the end.
   // A file that ends inside an entry raises the MFile error.
   const uint8_t* Next(std::size_t& size) {
@@ -52,7 +55,8 @@ class SortFileReader {
   std::vector<uint8_t> buffer_;
   std::size_t begin_ = 0;
   std::size_t end_ = 0;
-  int64_t remaining_ = 0;  // bytes of the file not yet read
+  int64_t next_ = 0;       // where the next read starts in the file
+  int64_t remaining_ = 0;  // bytes of the range not yet read
 };
 
 class SortFileWriter {

@@ -1,24 +1,28 @@
-// CEntrySort: the external merge sort of a raw entry file (sort_entry.h) into
-// one sorted file, shared by the word sort and the order sort.
+// CEntrySort: the external sort of index entries (sort_entry.h), shared by the
+// word sort and the order sort. Memory-bounded: entries are gathered in one
+// buffer of the memory budget and sorted in place in pieces as it fills (so
+// sorting keeps pace with a producer on another thread); a full buffer is
+// merged from its pieces and written as a run. At the end the runs (and the last one, still in memory) are
+// merged k ways at a time, so each entry is written and read about twice
+// however large the input. Only when more than kMergeWays runs exist does a
+// pass merge groups of them into longer runs first.
 //
-// Level one cuts the raw file into runs of 8,192 entries, each sorted in
-// memory by a stable bottom-up merge sort and written alternately to two run
-// files. Level two merges runs of length L (8,192 first) pairwise from two
-// input files into two output files, alternately, doubling L and swapping
-// inputs and outputs after each pass, until a pass writes at most one run.
-// The merge takes from the first input on ties, so the whole sort is stable:
-// entries with equal value and key keep their raw-file order.
+// The sorted file orders entries by value, then key; entries that compare
+// equal keep the order in which they were added (a run keeps it by its buffer
+// offsets, the merge by run number), so the result is the same file the
+// earlier two-way merge sort wrote.
 //
-// The four run files are delete-on-close temporary files of the group's work
-// folder: whatever happens, closing them removes them.
+// Run files are delete-on-close temporary files of the group's work folder:
+// whatever happens, closing them removes them.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
-#include <string>
+#include <memory>
 #include <vector>
 
-#include "format/sort_entry.h"
 #include "format/mfile.h"
+#include "format/sort_entry.h"
 
 namespace qm {
 
@@ -27,61 +31,111 @@ class SortFileWriter;
 
 class CEntrySort {
  public:
-  // Entries held in memory at a time, and the first merge run length.
-  static constexpr std::size_t kArrayEntries = 8192;
   // "Words Sorted" is traced each time this many more entries were sorted.
   static constexpr int64_t kSortedTraceStep = 100000;
+  // Runs merged at once; each takes a 64 KB read buffer.
+  static constexpr std::size_t kMergeWays = 64;
+  // The budget when the configuration store names none, and the least one.
+  static constexpr std::size_t kDefaultMemoryMb = 256;
+  static constexpr std::size_t kMinimumMemoryMb = 1;
+  // Progress while merging moves from the first to the second by the share
+  // of entries merged; the end of the sort reaches the second.
+  static constexpr int32_t kProgressSorting = 15;
+  static constexpr int32_t kProgressSorted = 90;
 
   // Which engine module reports the sort's failures (error 11 when the sort
-  // arrays cannot be allocated) and tags its traces.
+  // memory cannot be allocated) and tags its traces.
   enum class Module { PiSort, PiOrderSort };
 
-  CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module);
+  // The memory budget in bytes: "sort_memory_mb" of the configuration store
+  // (MORVIL_SORT_MEMORY_MB overrides it), default 256, at least 1.
+  static std::size_t ConfiguredMemoryBytes();
 
-  // Opens file on a new delete-on-close temporary file of the work folder:
-  // the raw entry file the caller fills, and the run files.
+  // memory_bytes: the run buffer; the merge adds its read buffers. Tests
+  // lower merge_ways to reach the passes over groups of runs with few runs.
+  CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module, std::size_t memory_bytes,
+             std::size_t merge_ways = kMergeWays);
+  CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module);
+  ~CEntrySort();
+  CEntrySort(const CEntrySort&) = delete;
+  CEntrySort& operator=(const CEntrySort&) = delete;
+
+  // Opens file on a new delete-on-close temporary file of the work folder.
   static void OpenSortFile(const CGlobalDefs& defs, MFile& file);
 
-  // Sorts raw (written from its start, any position) into sorted, which is
-  // left open for reading at its start; raw is closed. Progress: 20 after
-  // level one, then 20 + (70 div n) x n after each pass that wrote n runs.
+  // One entry of the layout, copied.
+  void Add(const uint8_t* entry, std::size_t size);
+  // Whole entries back to back.
+  void AddEntries(const uint8_t* entries, std::size_t bytes);
+  // Sorts what was added into sorted, a new temporary file left open for
+  // reading at its start, and frees the memory. Progress: 15 to 90.
+  void Finish(MFile& sorted);
+  // Adds every entry of raw (written from its start, any position), closes
+  // raw, and finishes into sorted.
   void Sort(MFile& raw, MFile& sorted);
 
-  // What the last Sort did.
-  int64_t EntriesSorted() const { return sorted_entries_; }
-  int64_t LevelOneRuns() const { return level_one_runs_; }
+  // What the sort did so far.
+  int64_t EntriesSorted() const { return entries_; }
+  int64_t Runs() const { return runs_; }
   int32_t MergePasses() const { return passes_; }
+  // Seconds spent sorting buffers and writing runs, and merging into sorted.
+  double RunSeconds() const { return run_seconds_; }
+  double MergeSeconds() const { return merge_seconds_; }
 
  private:
-  // The two sort arrays; error 11 when they cannot be had.
-  void AllocateRowArrays();
-  void FreeRowArrays();
-  void SortArray();
-  void WriteRun(SortFileWriter& out);
-  // Writes the runs alternately to runs[0] and runs[1].
-  void LevelOne(MFile& raw, MFile* runs);
-  // One merge pass; returns the number of runs written.
-  // in and out point to two files each.
-  int64_t MergePass(MFile* in, MFile* out, int64_t run_length);
-  // The passes of level two over the two level-one files, into sorted.
-  void MergeLevelTwo(MFile* level_one, MFile& sorted);
+  // An entry of the buffer: its comparison prefix and its offset. Slots fill
+  // the buffer from its end downwards while entries fill it from its start.
+  struct Slot {
+    uint64_t prefix;
+    uint64_t offset;
+  };
+  struct Run {
+    int64_t begin;
+    int64_t bytes;
+  };
+  class Merger;
+
+  void Merge(MFile& sorted);
+
+  // A sorted piece of the buffer's slots.
+  struct SlotRange {
+    const Slot* begin;
+    const Slot* end;
+  };
+
+  void Allocate();
   [[noreturn]] void RaiseAllocationFailure();
+  // The slot of the index-th entry added to the buffer.
+  Slot* SlotAt(std::size_t index) const;
+  std::size_t PieceBytes() const;
+  // Sorts the slots added since the last piece by entry, then offset.
+  void SortPiece();
+  // Every piece of the buffer, sorted, the earliest first.
+  std::vector<SlotRange> SortedPieces();
+  // Merges the pieces of the buffer into one run of the run file.
+  void SpillRun();
+  void ClearBuffer();
+  Slot* SlotsBegin() const;
   const char* TraceTag() const;
 
   CGlobalDefs& defs_;
   SortEntryLayout layout_;
   Module module_;
-  std::vector<uint8_t> arena_;       // the entries of the array, back to back
-  // An entry of the array: where it lies in arena_, and its prefix.
-  struct Slot {
-    uint64_t prefix;
-    uint32_t offset;
-  };
-  std::vector<Slot> entries_a_;
-  std::vector<Slot> entries_b_;  // the merge sort's second array
-  int64_t sorted_entries_ = 0;
-  int64_t level_one_runs_ = 0;
+  std::size_t buffer_bytes_;
+  std::size_t merge_ways_;
+  std::unique_ptr<std::byte[]> buffer_;
+  std::size_t fill_ = 0;   // entry bytes at the start of buffer_
+  std::size_t slots_ = 0;  // slots at the end of buffer_
+  std::vector<std::size_t> pieces_;  // the slot counts at which pieces end
+  std::size_t piece_fill_ = 0;       // fill_ when the last piece ended
+  MFile run_file_;
+  std::vector<Run> runs_in_file_;
+  int64_t entries_ = 0;
+  int64_t traced_ = 0;
+  int64_t runs_ = 0;
   int32_t passes_ = 0;
+  double run_seconds_ = 0;
+  double merge_seconds_ = 0;
 };
 
 }  // namespace qm

@@ -3,6 +3,8 @@
 #include <sqlext.h>
 
 #include <algorithm>
+#include <atomic>
+#include <chrono>
 #include <cmath>
 #include <limits>
 #include <new>
@@ -12,6 +14,8 @@
 #include "base/error_numbers.h"
 #include "index/document_column.h"
 #include "index/entry_sort.h"
+#include "index/entry_block_queue.h"
+#include "config/megabyte_setting.h"
 #include "format/findex_type.h"
 #include "index/row_keys.h"
 #include "index/row_selection.h"
@@ -33,6 +37,9 @@ constexpr const char* kSortTag = "PILIB.PiSort.SortFindexTable";
 constexpr const char* kRowsTag = "PILIB.PiSort.WriteFindexRows";
 constexpr const char* kRowsMethod = "WriteFindexRows";
 constexpr int64_t kRowTraceStep = 100000;
+constexpr std::size_t kDefaultColumnTextMb = 64;
+
+std::atomic<int64_t> g_cut_values{0};
 
 bool IsText(VALUE_TYPE t) { return t == VALUE_TYPE::AsciiString || t == VALUE_TYPE::UnicodeString; }
 
@@ -42,6 +49,7 @@ bool IsBinary(int16_t sql_type) {
 
 // One indexed column of the result set, as the row loop reads it.
 struct IndexedColumn {
+  std::string name;
   int index = 0;  // 1-based, in the result set
   VALUE_TYPE own_type = VALUE_TYPE::AsciiString;
   bool binary = false;
@@ -76,6 +84,7 @@ struct RowPlan {
     int next = 2;
     for (const auto& [name, tags] : definition.Columns) {
       IndexedColumn c;
+      c.name = name;
       c.index = by_name ? RequireColumn(database, name) : next++;
       c.own_type = database.GetFieldType(c.index);
       c.binary = IsBinary(database.GetColumnDescription(c.index).sql_type);
@@ -88,15 +97,13 @@ struct RowPlan {
 };
 
 // The row loop's writer of entries: the item row of the current row and
-// column, one value after it, into the raw file.
+// column, one value after it, handed to the sorting thread's queue.
 class EntryWriter {
  public:
-  EntryWriter(MFile& raw, const SortEntryLayout& layout, const CColumnSet& set)
-      : layout_(layout), row_(static_cast<std::size_t>(set.Width()), 0),
+  EntryWriter(EntryBlockQueue& queue, const SortEntryLayout& layout, const CColumnSet& set)
+      : queue_(queue), layout_(layout), row_(static_cast<std::size_t>(set.Width()), 0),
         score_column_(set.s != 0 ? set.ScoreColumn() : -1),
-        position_column_(set.p != 0 ? set.PositionColumn() : -1) {
-    raw_.Start(raw);
-  }
+        position_column_(set.p != 0 ? set.PositionColumn() : -1) {}
 
   void SetKey(int32_t key) { row_[0] = key; }
   void SetWeight(int32_t weight) {
@@ -111,7 +118,7 @@ class EntryWriter {
     entry_.clear();
     SortEntryLayout::AppendRow(entry_, row_);
     append_value(entry_);
-    raw_.Put(entry_.data(), entry_.size());
+    queue_.Put(entry_.data(), entry_.size());
     ++entries_;
   }
   void WriteText(std::u16string_view word) {
@@ -119,11 +126,9 @@ class EntryWriter {
   }
 
   int64_t Entries() const { return entries_; }
-  // REQUIRES: before the raw file is read.
-  void Finish() { raw_.Finish(); }
 
  private:
-  SortFileWriter raw_;
+  EntryBlockQueue& queue_;
   const SortEntryLayout& layout_;
   std::vector<int32_t> row_;
   int32_t score_column_;
@@ -131,6 +136,30 @@ class EntryWriter {
   std::vector<uint8_t> entry_;
   int64_t entries_ = 0;
 };
+
+// Progress from 5 to 15 by rows read, in steps of at least 1%, when the
+// driver knows how many rows come.
+class RowProgress {
+ public:
+  RowProgress(CGlobalDefs& defs, int64_t expected) : defs_(defs), expected_(expected) {}
+  void Row(int64_t rows) {
+    if (expected_ <= 0 || rows < next_) return;
+    const int64_t percent = std::min<int64_t>(100, rows * 100 / expected_);
+    defs_.SetProgress(static_cast<int32_t>(5 + percent / 10));
+    next_ = (percent + 1) * expected_ / 100 + 1;
+  }
+
+ private:
+  CGlobalDefs& defs_;
+  int64_t expected_;
+  int64_t next_ = 0;
+};
+
+using Clock = std::chrono::steady_clock;
+
+double SecondsSince(Clock::time_point start) {
+  return std::chrono::duration<double>(Clock::now() - start).count();
+}
 
 }  // namespace
 
@@ -143,7 +172,14 @@ void CPiSort::ExecuteSelect(CShareDatabase& database, CIndexHeader& definition) 
   RowSelection::FromHeader(definition).Execute(database, defs_.TraceLevel1(), kSortTag);
 }
 
-int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHeader& definition) {
+int64_t CPiSort::CutValuesInProcess() { return g_cut_values.load(); }
+
+std::size_t CPiSort::ConfiguredColumnTextBytes() {
+  return ReadMegabyteSetting("max_column_text_mb", kDefaultColumnTextMb, 1);
+}
+
+int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definition,
+                                 MFile& sorted, std::optional<EntrySortingThread>& sorting) {
   database.AllocateCache();
   const RowPlan plan(database, definition);
   definition.FindexType = plan.findex_type;
@@ -152,10 +188,17 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
   const auto type = static_cast<VALUE_TYPE>(plan.findex_type);
   const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
   const SortEntryLayout layout(set.Width(), type);
-  EntryWriter writer(raw, layout, set);
+  sorting.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted, method_);
+  EntryWriter writer(sorting->Queue(), layout, set);
   std::optional<CWordPipeline> pipeline;
   if (IsText(type)) pipeline.emplace(defs_, WordPipelineOptions::FromHeader(definition));
   DocumentTexts documents(defs_);
+  // Indexed text is read whole: a word anywhere in a value must be found.
+  const std::size_t text_limit = ConfiguredColumnTextBytes();
+  for (const IndexedColumn& column : plan.columns) {
+    if (IsText(column.own_type) && !column.binary) database.SetWholeText(column.index, text_limit);
+  }
+  RowProgress progress(defs_, database.GetResultRowCount());
 
   RowKeys keys(plan.key_index, plan.key_type, plan.date_key_index, definition.SortMax,
                definition.MaxDateTimeKey);
@@ -184,7 +227,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
             warning.GetCurrentEntry().text);
       break;
     }
-    writer.SetKey(keys.Read<CPiSortException>(database, kRowsMethod));
+    const int32_t key = keys.Read<CPiSortException>(database, kRowsMethod);
+    writer.SetKey(key);
 
     int32_t position = 0;
     for (std::size_t i = 0; i < plan.columns.size(); ++i) {
@@ -221,6 +265,14 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
         ++nulls;
         continue;
       }
+      if (database.WasCut(column.index)) {
+        ++cut_values_;
+        ++g_cut_values;
+        Trace(true, kRowsTag,
+              "Column text longer than %i MB cut there. Findex: %s, Key: %i, Column: %s",
+              static_cast<int64_t>(text_limit / (1024 * 1024)), definition.IndexName,
+              key, column.name);
+      }
       if (column.document.IsDocument()) {
         document_text = documents.Text(column.document, value.Narrow(), column.binary);
         write_words(std::string_view(document_text), position);
@@ -233,10 +285,10 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
     database.CleanCacheColumns();
     ++rows;
     if (rows % kRowTraceStep == 0) Trace(defs_.TraceLevel1(), kRowsTag, "Reading row %i", rows);
+    progress.Row(rows);
     if (database.MoveNext() != CShareDatabase::kRowFetched) break;
   }
 
-  writer.Finish();
   Trace(defs_.TraceLevel1(), kRowsTag, "End Status. Row Count %i, Word Count: %i, Null Count: %i",
         rows, writer.Entries(), nulls);
   definition.SortMax = keys.SortMax();
@@ -247,6 +299,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
 }
 
 int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows no_rows) {
+  cut_values_ = 0;
+  phases_ = Phases{};
   return Guard<CPiSortException, CPiSortUnknownException>("SortFindexTable", [&] {
     // The connection stored with the findex serves when the caller set none;
     // the caller's settings stay as they are.
@@ -254,25 +308,33 @@ int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows
     if (!source.IsConnectionSet() && !definition.ConnectionString.empty()) {
       source.SetConnection(definition.ConnectionString, definition.DisplayName);
     }
-    MFile raw;
+    std::optional<EntrySortingThread> sorting;
     int64_t rows = 0;
-    {
+    const Clock::time_point start = Clock::now();
+    try {
       CShareDatabase database(source);
       database.Connect();
       ExecuteSelect(database, definition);
-      CEntrySort::OpenSortFile(defs_, raw);
-      rows = WriteFindexRows(database, raw, definition);
+      rows = WriteFindexRows(database, definition, sorted, sorting);
+    } catch (const EntryBlockQueue::Stopped&) {
+      // The sorting thread failed first: its error ends the build.
+      sorting->Finish();
+      throw CPiSortUnknownException::Unknown("SortFindexTable");
     }
+    // Any other failure of the row loop stops the sorting thread (its
+    // destructor) and goes on as it is.
+    phases_.row_loop = SecondsSince(start);
     if (rows == 0) {
+      sorting->Abort();
       if (no_rows == NoRows::Allow) return rows;
       throw CPiSortException::Numbered(kErrFindexNoRows, "SortFindexTable", nullptr);
     }
     defs_.SetProgress(15);
-
-    const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
-    CEntrySort sort(defs_, SortEntryLayout(set.Width(), static_cast<VALUE_TYPE>(definition.FindexType)),
-                    CEntrySort::Module::PiSort);
-    sort.Sort(raw, sorted);
+    const Clock::time_point merge_start = Clock::now();
+    sorting->Finish();
+    phases_.merge = SecondsSince(merge_start);
+    phases_.runs = sorting->RunSeconds();
+    phases_.run_count = sorting->Runs();
     return rows;
   });
 }

@@ -42,6 +42,13 @@ constexpr int kMaxTypindexTries = 100;
 // The index name prefix "typindex" is kept as written: existing indexes carry it.
 constexpr std::string_view kTypindex = "typindex";
 
+// A column read whole is already cut to its byte limit; others keep the
+// engine's character cut.
+template <class Column>
+std::size_t CharacterLimit(const Column& c) {
+  return c.whole_text_bytes > 0 ? std::numeric_limits<std::size_t>::max() : kMaxColumnCharacters;
+}
+
 SQLHSTMT Stmt(const OdbcHandle& h) { return static_cast<SQLHSTMT>(h.Get()); }
 SQLHDBC Dbc(const OdbcHandle& h) { return static_cast<SQLHDBC>(h.Get()); }
 
@@ -429,6 +436,7 @@ void CShareDatabase::DescribeColumns(int16_t count) {
       name = WholeCharacters(reinterpret_cast<const char*>(narrow_name));
     }
     Column& c = columns_[static_cast<std::size_t>(i - 1)];
+    c = Column{};  // nothing of the statement before carries over
     c.description.name = std::move(name);
     c.description.upper_name = ToUpper(c.description.name);
     c.description.sql_type = type;
@@ -513,6 +521,11 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
   Column& column = columns_[static_cast<std::size_t>(index - 1)];
   const std::size_t terminator = c_type == SQL_C_WCHAR ? 2 : 1;
   chunk_.clear();
+  column.cut = false;
+  // A whole-text column reads one unit past its limit, to tell a value that
+  // ends there from one that goes on.
+  const std::size_t enough =
+      column.whole_text_bytes > 0 ? column.whole_text_bytes + terminator : kEnoughTextBytes;
   // The first piece is sized to the column's values so far: drivers may fill
   // the whole buffer they are given (strncpy), so a large one costs on every row.
   std::size_t length = column.piece_bytes;
@@ -540,11 +553,23 @@ bool CShareDatabase::ReadTextBytes(int index, int16_t c_type, std::string_view& 
       return true;
     }
     chunk_.append(read_buffer_.data(), got);
-    if (!more || chunk_.size() >= kEnoughTextBytes) break;
+    if (!more || chunk_.size() >= enough) break;
     length = read_buffer_.size();
   }
   column.piece_bytes = std::min(std::bit_ceil(chunk_.size() + terminator), read_buffer_.size());
   bytes = chunk_;
+  if (column.whole_text_bytes > 0 && bytes.size() > column.whole_text_bytes) {
+    column.cut = true;
+    if (c_type == SQL_C_WCHAR) {
+      // Units in the machine's order; a surrogate pair stays whole.
+      std::u16string_view units(reinterpret_cast<const char16_t*>(chunk_.data()),
+                                chunk_.size() / sizeof(char16_t));
+      bytes = bytes.substr(0, Utf16CutLength(units, column.whole_text_bytes / sizeof(char16_t)) *
+                                  sizeof(char16_t));
+    } else {
+      bytes = bytes.substr(0, Utf8CutLength(bytes, column.whole_text_bytes));
+    }
+  }
   return true;
 }
 
@@ -655,7 +680,7 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
               std::min<std::size_t>(c.description.size + 1ull, kMaxColumnCharacters));
         }
         if (!ReadTextBytes(index, SQL_C_CHAR, bytes)) return null_value();
-        AssignColumnText(bytes, kMaxColumnCharacters, value.NarrowBuffer());
+        AssignColumnText(bytes, CharacterLimit(c), value.NarrowBuffer());
         value.SetType(VALUE_TYPE::AsciiString);
         return kValueRead;
       } catch (const std::bad_alloc&) {
@@ -670,7 +695,7 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
         // SQLWCHAR units in the machine's own order, as the driver wrote them.
         wide_units_.resize(bytes.size() / sizeof(char16_t));
         std::memcpy(wide_units_.data(), bytes.data(), wide_units_.size() * sizeof(char16_t));
-        AssignColumnText(wide_units_, kMaxColumnCharacters, value.WideBuffer());
+        AssignColumnText(wide_units_, CharacterLimit(c), value.WideBuffer());
         value.SetType(VALUE_TYPE::UnicodeString);
         return kValueRead;
       } catch (const std::bad_alloc&) {
@@ -682,6 +707,22 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
       return kValueRead;
   }
   return kValueRead;
+}
+
+void CShareDatabase::SetWholeText(int index, std::size_t max_bytes) {
+  CheckIndex(index, "SetWholeText");
+  columns_[static_cast<std::size_t>(index - 1)].whole_text_bytes = max_bytes;
+}
+
+bool CShareDatabase::WasCut(int index) const {
+  CheckIndex(index, "WasCut");
+  return columns_[static_cast<std::size_t>(index - 1)].cut;
+}
+
+int64_t CShareDatabase::GetResultRowCount() const {
+  SQLLEN rows = -1;
+  if (!statement_ || !SQL_SUCCEEDED(SQLRowCount(Stmt(statement_), &rows))) return -1;
+  return rows > 0 ? static_cast<int64_t>(rows) : -1;
 }
 
 int CShareDatabase::GetColumnValue(int index, CValue& value, bool reserve, int32_t requested_type) {

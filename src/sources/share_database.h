@@ -102,6 +102,17 @@ class CShareDatabase {
   // Removes the temporary files the cache made for binary columns.
   void CleanCacheColumns();
 
+  // Text of column index (of the executed statement) is read whole, up to
+  // max_bytes of text as the driver sends it (UTF-8, or UTF-16 for wide
+  // columns) and cut there at a character boundary; 0 brings back the cut at
+  // kMaxColumnCharacters. Other kinds of column ignore it.
+  void SetWholeText(int index, std::size_t max_bytes);
+  // Whether the last read of column index stopped at its whole-text limit.
+  bool WasCut(int index) const;
+  // The rows the executed statement gives, when the driver knows it before
+  // they are fetched; -1 when it does not.
+  int64_t GetResultRowCount() const;
+
   // Creates a data-source index from "CREATE INDEX name rest" as "create index
   // typindexN rest" with the first free N (1 to 100). Connects and disconnects.
   void CreateIndex(std::string_view statement);
@@ -123,6 +134,8 @@ class CShareDatabase {
     VALUE_TYPE value_type = VALUE_TYPE::AsciiString;
     ReadKind read_kind = ReadKind::NarrowText;
     std::size_t piece_bytes = 0;  // buffer length of the first SQLGetData call
+    std::size_t whole_text_bytes = 0;  // 0: the character cut
+    bool cut = false;                  // the last read stopped at whole_text_bytes
   };
 
   void CheckIndex(int index, const char* method) const;
@@ -138,7 +151,8 @@ class CShareDatabase {
 
   void DescribeColumns(int16_t count);
   // Reads the text of a column (bytes as the driver gives them, pieces joined),
-  // stopping once there is enough for kMaxColumnCharacters. bytes stays valid
+  // stopping once there is enough for kMaxColumnCharacters, or for a column
+  // read whole at its limit, cut at a character boundary. bytes stays valid
   // until the next read. Returns false for NULL.
   bool ReadTextBytes(int index, int16_t c_type, std::string_view& bytes);
   bool ReadBinaryToFile(int index, CValue& value);

@@ -1,16 +1,17 @@
-// The external merge sort on its own: entries of every value type, runs of
-// 8,192, multi-pass merges whose run files shrink between passes, stability,
-// the pass traces and progress, and the allocation failure.
+// The memory-bounded external sort on its own: entries of every value type
+// through runs and k-way merges (with passes over groups of runs), written
+// byte for byte as the earlier two-way merge sort writes them; the pass
+// traces and progress, the allocation failure, and no run file left behind.
 #include "index/entry_sort.h"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <limits>
-#include <numeric>
 #include <random>
 
 #include "format/sort_entry.h"
+#include "index/two_way_merge_sort.h"
 #include "platform/text_encoding.h"
 #include "base/checked_allocation.h"
 #include "base/exception_family.h"
@@ -66,12 +67,11 @@ void AppendRandomValue(const SortEntryLayout& layout, std::mt19937& random,
 
 class EntrySortTest : public ::testing::Test {
  protected:
-  // Writes n random entries (key 0-19, then the raw-file order as the
-  // second item), sorts them and reads the sorted file back.
-  std::vector<SortedEntry> SortRandom(VALUE_TYPE type, int n, CEntrySort* used = nullptr) {
+  // n random entries (key 0-19, then the raw-file order as the second item)
+  // in a new raw file.
+  void WriteRandom(MFile& raw, VALUE_TYPE type, int n) {
     const SortEntryLayout layout(2, type);
     std::mt19937 random(static_cast<unsigned>(n) * 7 + static_cast<unsigned>(type));
-    MFile raw;
     CEntrySort::OpenSortFile(home_.Defs(), raw);
     std::vector<uint8_t> entry;
     for (int i = 0; i < n; ++i) {
@@ -81,19 +81,13 @@ class EntrySortTest : public ::testing::Test {
       AppendRandomValue(layout, random, entry);
       raw.mwrite(entry.data(), entry.size());
     }
-    CEntrySort local(home_.Defs(), layout, CEntrySort::Module::PiSort);
-    CEntrySort& sort = used != nullptr ? *used : local;
-    MFile sorted;
-    sort.Sort(raw, sorted);
-    EXPECT_FALSE(raw.IsOpen());
-    auto entries = ReadSortedEntries(sorted, 2, type);
-    // Every raw entry comes out exactly once.
-    std::vector<int32_t> order, expected(static_cast<std::size_t>(n));
-    for (const auto& e : entries) order.push_back(e.row[1]);
-    std::sort(order.begin(), order.end());
-    std::iota(expected.begin(), expected.end(), 0);
-    EXPECT_TRUE(order == expected) << "entries lost or repeated";
-    return entries;
+  }
+
+  static std::string Bytes(MFile& file) {
+    std::string bytes(static_cast<std::size_t>(file.FileSize(false)), '\0');
+    if (!bytes.empty()) file.mread(bytes.data(), bytes.size());
+    file.Seek(0);
+    return bytes;
   }
 
   std::vector<std::string> TurnsLeft() const {
@@ -109,32 +103,64 @@ class EntrySortTest : public ::testing::Test {
   test::SortHome home_;
 };
 
-TEST_F(EntrySortTest, EveryTypeSortsByValueThenKeyStablyAcrossMergePasses) {
-  // 40,000 entries: five level-one runs, the last short; passes write 3, 2, 1
-  // runs, and one run file holds less in the third pass than in the first.
-  for (VALUE_TYPE type : {VALUE_TYPE::AsciiString, VALUE_TYPE::UnicodeString, VALUE_TYPE::Integer,
-                          VALUE_TYPE::Double, VALUE_TYPE::DateTime}) {
-    SCOPED_TRACE(static_cast<int>(type));
-    CEntrySort sort(home_.Defs(), SortEntryLayout(2, type), CEntrySort::Module::PiSort);
-    test::ExpectSortedAndStable(SortRandom(type, 40000, &sort), 1);
-    EXPECT_EQ(sort.LevelOneRuns(), 5);
-    EXPECT_EQ(sort.MergePasses(), 3);
+TEST_F(EntrySortTest, RunsAndMergesWriteTheSameFileAsTheTwoWayMergeSort) {
+  // 40,000 entries of about 36 bytes with their slots: six runs of the
+  // smallest buffer. Merging two at a time takes passes over groups of runs;
+  // the widest merge takes them in one, the last run straight from memory.
+  struct Case {
+    VALUE_TYPE type;
+    std::size_t merge_ways;
+    bool several_passes;
+  };
+  const Case cases[] = {
+      {VALUE_TYPE::AsciiString, 2, true},   {VALUE_TYPE::AsciiString, CEntrySort::kMergeWays, false},
+      {VALUE_TYPE::UnicodeString, 3, true}, {VALUE_TYPE::Integer, 2, true},
+      {VALUE_TYPE::Double, CEntrySort::kMergeWays, false}, {VALUE_TYPE::DateTime, 2, true},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(testing::Message() << static_cast<int>(c.type) << " ways " << c.merge_ways);
+    const SortEntryLayout layout(2, c.type);
+    MFile raw_new, raw_old, sorted_new, sorted_old;
+    WriteRandom(raw_new, c.type, 40000);
+    WriteRandom(raw_old, c.type, 40000);
+    CEntrySort sort(home_.Defs(), layout, CEntrySort::Module::PiSort, 256 * 1024, c.merge_ways);
+    sort.Sort(raw_new, sorted_new);
+    CTwoWayMergeSort(home_.Defs(), layout, CTwoWayMergeSort::Module::PiSort)
+        .Sort(raw_old, sorted_old);
+    EXPECT_FALSE(raw_new.IsOpen());
+    EXPECT_GE(sort.Runs(), 4);
+    EXPECT_EQ(sort.MergePasses() > 1, c.several_passes);
     EXPECT_EQ(sort.EntriesSorted(), 40000);
+    const std::string bytes = Bytes(sorted_new);
+    EXPECT_TRUE(bytes == Bytes(sorted_old)) << "the sorted files differ";
+    const auto entries = ReadSortedEntries(sorted_new, 2, c.type);
+    ASSERT_EQ(entries.size(), 40000u);
+    test::ExpectSortedAndStable(entries, 1);
   }
-  const std::vector<std::string> turns = TurnsLeft();
-  ASSERT_EQ(turns.size(), 15u);
-  EXPECT_EQ(std::vector<std::string>(turns.begin(), turns.begin() + 3),
-            (std::vector<std::string>{"3", "2", "1"}));
   EXPECT_EQ(home_.Defs().GetProgress(), 90);
   EXPECT_TRUE(home_.WorkFiles().empty());
 }
 
-TEST_F(EntrySortTest, ArraysThatCannotBeAllocatedRaiseErrorElevenAndLeaveNoFile) {
+TEST_F(EntrySortTest, EachMergePassTracesTheRunsItWrote) {
+  MFile raw, sorted;
+  WriteRandom(raw, VALUE_TYPE::Integer, 40000);
+  CEntrySort sort(home_.Defs(), SortEntryLayout(2, VALUE_TYPE::Integer),
+                  CEntrySort::Module::PiSort, 256 * 1024, 2);
+  sort.Sort(raw, sorted);
+  // 40,000 entries of 12 bytes, each with a 16-byte slot: four full buffers
+  // and the rest. Two at a time, the passes write 3, 2 and 1 runs.
+  ASSERT_EQ(sort.Runs(), 5);
+  EXPECT_EQ(sort.MergePasses(), 3);
+  EXPECT_EQ(TurnsLeft(), (std::vector<std::string>{"3", "2", "1"}));
+}
+
+TEST_F(EntrySortTest, MemoryThatCannotBeAllocatedRaisesErrorElevenAndLeavesNoFile) {
   const SortEntryLayout layout(1, VALUE_TYPE::Integer);
   MFile raw;
-  CEntrySort::OpenSortFile(home_.Defs(), raw);
-  SetAllocationLimitForTesting(16 * 1024);  // below two arrays of 8,192 offsets
-  CEntrySort sort(home_.Defs(), layout, CEntrySort::Module::PiOrderSort);
+  WriteRandom(raw, VALUE_TYPE::Integer, 10);
+  SetAllocationLimitForTesting(16 * 1024);  // below the smallest sort buffer
+  CEntrySort sort(home_.Defs(), SortEntryLayout(2, VALUE_TYPE::Integer),
+                  CEntrySort::Module::PiOrderSort);
   MFile sorted;
   try {
     sort.Sort(raw, sorted);

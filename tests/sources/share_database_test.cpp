@@ -219,6 +219,40 @@ TEST_P(SourceTest, EveryColumnKindReadsTheSameThroughEveryDriver) {
   db.Disconnect();
 }
 
+TEST_P(SourceTest, WholeTextIsReadToItsLimitAndCutBetweenCharacters) {
+  CShareDatabase db(defs_);
+  db.Connect();
+  const std::string t = UniqueTable("whole");
+  Run(db, "CREATE TABLE " + t + " (id INTEGER, body TEXT)");
+  std::string long_text = "x";
+  for (int i = 0; i < 3000; ++i) long_text += "é";  // 6,001 bytes, 3,001 characters
+  Run(db, "INSERT INTO " + t + " VALUES (1, '" + long_text + "'), (2, 'short')");
+  int16_t n = 0;
+  db.ExecuteSql("SELECT body FROM " + t + " ORDER BY id", n);
+  db.AllocateCache();
+  // 3,000 bytes as the driver sends them: UTF-8 "x" and 1,499 whole "é" (the
+  // next one would end past the limit), or 1,500 UTF-16 units.
+  db.SetWholeText(1, 3000);
+  CValue v;
+  db.CacheColumns();
+  EXPECT_TRUE(db.WasCut(1));
+  db.GetColumnValueFromCache(1, VALUE_TYPE::UnicodeString, v);
+  EXPECT_EQ(v.Wide().size(), 1500u);
+  EXPECT_EQ(v.Wide().back(), u'\u00e9');
+  ASSERT_EQ(db.MoveNext(), 0);
+  db.CacheColumns();
+  EXPECT_FALSE(db.WasCut(1));
+
+  // Without a limit the engine's cut of 2,000 characters holds.
+  db.ExecuteSql("SELECT body FROM " + t + " ORDER BY id", n);
+  db.AllocateCache();
+  db.CacheColumns();
+  db.GetColumnValueFromCache(1, VALUE_TYPE::UnicodeString, v);
+  EXPECT_EQ(v.Wide().size(), 2000u);
+  EXPECT_FALSE(db.WasCut(1));
+  Run(db, "DROP TABLE " + t);
+}
+
 TEST_P(SourceTest, EmptyResultWarnsOnFirstReadAndEndsTheRows) {
   CShareDatabase db(defs_);
   db.Connect();

@@ -2,6 +2,7 @@
 // runs them: exit statuses, standard output and standard error, and settings
 // that last from one invocation to the next.
 #include <gtest/gtest.h>
+#include <stdlib.h>
 
 #include <algorithm>
 #include <filesystem>
@@ -133,6 +134,25 @@ TEST_F(EngineCommandsTest, ExecBuildsUpdatesAndDropsAFindexThatInfoAndExistsSee)
   EXPECT_NE(Host({"info", "findex", "Books"}).out.find("idxKeyCount\t3\n"), std::string::npos);
   EXPECT_EQ(Host({"drop", "findex", "Books"}).status, 0);
   EXPECT_EQ(Host({"exists", "Books"}).out, "no\n");
+}
+
+TEST_F(EngineCommandsTest, ExecCountsTheTextValuesCutAtTheLimit) {
+  std::string body;
+  while (body.size() < 1100000) body += "long text ";
+  const std::string connect =
+      Books({"create table books (id integer, body text)",
+             "insert into books values (1, 'short'), (2, '" + body + "'), (3, '" + body + "')"});
+  ASSERT_EQ(Host({"init"}).status, 0);  // the language data the build needs
+  setenv("MORVIL_MAX_COLUMN_TEXT_MB", "1", 1);
+  const Result cut = Host({"--connect", connect, "exec",
+                           "CREATE FINDEX Books ON TABLE books COLUMNS body KEY id"});
+  unsetenv("MORVIL_MAX_COLUMN_TEXT_MB");
+  ASSERT_EQ(cut.status, 0) << cut.err;
+  EXPECT_EQ(cut.out, "2 text value(s) longer than max_column_text_mb were cut there (see the trace)\n");
+  const Result whole = Host({"--connect", connect, "exec",
+                             "CREATE FINDEX Books ON TABLE books COLUMNS body KEY id"});
+  ASSERT_EQ(whole.status, 0) << whole.err;
+  EXPECT_EQ(whole.out, "");
 }
 
 TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {

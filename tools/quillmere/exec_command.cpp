@@ -8,6 +8,7 @@
 
 #include "command_registry.h"
 #include "host_session.h"
+#include "index/word_sort.h"
 #include "platform/terminal.h"
 #include "platform/text_encoding.h"
 
@@ -71,6 +72,16 @@ int RunBackground(HostSession& session, const BSTR* statement) {
   return session.Fail(Utf16ToUtf8(message));
 }
 
+// The build summary's count of text values cut at max_column_text_mb; the
+// trace names each one (findex, key, column).
+void ReportCutValues(int64_t before) {
+  const int64_t cut = CPiSort::CutValuesInProcess() - before;
+  if (cut > 0) {
+    std::printf("%lld text value(s) longer than max_column_text_mb were cut there (see the trace)\n",
+                static_cast<long long>(cut));
+  }
+}
+
 int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("exec");
   bool background = false;
@@ -92,9 +103,13 @@ int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
   if (statement.empty()) return session.Usage("no statement given", kUsage);
   if (!session.Open(global)) return kExitError;
   const BSTR* text = session.Text(statement);
-  if (background) return RunBackground(session, text);
-  if (session.Command().ExecuteEx(text, VARIANT_TRUE) != S_OK) return session.Fail();
-  return kExitOk;
+  const int64_t cut_before = CPiSort::CutValuesInProcess();
+  const int result = background ? RunBackground(session, text)
+                                : (session.Command().ExecuteEx(text, VARIANT_TRUE) != S_OK
+                                       ? session.Fail()
+                                       : kExitOk);
+  ReportCutValues(cut_before);
+  return result;
 }
 
 const CommandRegistration kExec{{"exec", kUsage, "run a command statement", RunExec}};

@@ -447,11 +447,16 @@ std::u16string CGiCmdTree::RemoveStopWords(std::u16string_view value,
   std::u16string out;
   out.reserve(value.size());
   std::size_t start = 0;
+  // Only words inside quotes are searched for: a word between quoted values is
+  // an operator ('red' OR 'blue'), and dropping it as the stop word "or" would
+  // change what is asked.
+  bool quoted = false;
   for (std::size_t i = 0; i <= value.size(); ++i) {
     const bool at_end = i == value.size();
     if (!at_end && value[i] != u'\'' && !IsValueSeparatorAt(value, i, separators)) continue;
     const std::u16string_view word = value.substr(start, i - start);
-    const bool stop = !word.empty() && language_->IsStopWord(word);
+    const bool stop = quoted && !word.empty() && language_->IsStopWord(word);
+    if (!at_end && value[i] == u'\'') quoted = !quoted;
     if (!stop) {
       out.append(word);
       if (!at_end) out.push_back(value[i]);

@@ -64,6 +64,9 @@ TEST_F(StatementCatalogueTest, ValuesFollowTheFindexTheyName) {
   };
   const Case cases[] = {
       {"STOPPED='the river of life'", "STOPPED{ADJ(RIVER,LIFE)}"},
+      // Operators between values are no stop words, though "or" and "and" are.
+      {"STOPPED='the river' OR 'life'", "STOPPED{OR(RIVER,LIFE)}"},
+      {"STOPPED='river' AND 'life'", "STOPPED{AND(RIVER,LIFE)}"},
       {"KEPT='the river'", "KEPT{ADJ(THE,RIVER)}"},
       {"KEPT='red-wine'", "KEPT{ADJ(RED,WINE)}"},
       {"SPACED='red-wine'", "SPACED{RED-WINE}"},

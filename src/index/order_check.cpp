@@ -13,6 +13,7 @@
 #include "format/order_column_file.h"
 #include "format/order_info.h"
 #include "format/order_layout.h"
+#include "index/damage_text.h"
 #include "index/order_file_set.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
@@ -25,17 +26,6 @@ constexpr std::size_t kMostProblems = 50;
 
 std::string FileName(const std::string& path) { return path.substr(path.find_last_of('/') + 1); }
 
-// A failure's message chain on one line.
-std::string Explain(const CExceptionBase& e) {
-  std::string text = e.GetFullTextUtf8(kLevelGeneral);
-  for (auto at = text.find("\r\n"); at != std::string::npos; at = text.find("\r\n", at)) {
-    text.replace(at, 2, "; ");
-  }
-  while (!text.empty() && (text.back() == ' ' || text.back() == ';' || text.back() == '\n')) {
-    text.pop_back();
-  }
-  return text;
-}
 
 // A column file value (its encoded bytes) as a value of type, to be compared.
 CValue DecodeColumnValue(const std::vector<uint8_t>& bytes, VALUE_TYPE type) {
@@ -76,7 +66,7 @@ class OrderCheck {
       info_.ReadInfo(sri);
     } catch (const CExceptionBase& e) {
       return Problem(sri_name_ + " header (block 0): does not read: " +
-                     Explain(e));
+                     DamageText(e));
     }
     if (!Layouts()) return;
     if (!Rows(paths.srt)) return;
@@ -216,7 +206,7 @@ class OrderCheck {
       }
     } catch (const CExceptionBase& e) {
       return Problem(file_name + " value " + std::to_string(rank + 1) +
-                     ": does not read: " + Explain(e));
+                     ": does not read: " + DamageText(e));
     }
     int64_t ranked = 0;
     for (int32_t r = 0; r < Count(); ++r) {

@@ -16,6 +16,7 @@ enum idxInfoEnum : int32_t {
   idxKeyCount = 7,   // summed over the add-on findexes
   idxVersion = 10,
   idxDistinctWordCount = 11,   // summed over the add-on findexes
+  // Enumeration names kept as written (hosts use them): do not correct.
   idxFracmentationLevel = 21,  // the number of add-on findexes
   idxDBConnectionString = 35,
   idxSQLSelect = 36,       // lower-cased
@@ -92,6 +93,7 @@ enum iuoUpdateOptionEnum : int32_t {
 // GetOrderGeneralOption.
 enum ogoGeneralOptionEnum : int32_t {
   ogoIgnoreChars = -1,
+  // Enumeration names kept as written (hosts use them): do not correct.
   ogoIgnorreCase = 1,
   ogoSaveDatabaseConnection = 2,
 };

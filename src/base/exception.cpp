@@ -33,6 +33,16 @@ void CExceptionBase::AppendCurrentAndInner(const CExceptionBase* inner) {
   if (inner != nullptr) {
     entries_.insert(entries_.end(), inner->entries_.begin(), inner->entries_.end());
   }
+  RefreshWhat();
+}
+
+void CExceptionBase::RefreshWhat() {
+  std::u16string text;
+  for (const auto& e : entries_) {
+    if (!text.empty()) text += u" <- ";
+    text += e.text;
+  }
+  what_ = Utf16ToUtf8(text);
 }
 
 void CExceptionBase::BuildGeneral(std::string_view module, const char* method,
@@ -43,6 +53,7 @@ void CExceptionBase::BuildGeneral(std::string_view module, const char* method,
   if (inner != nullptr) {
     entries_.insert(entries_.end(), inner->entries_.begin(), inner->entries_.end());
   }
+  RefreshWhat();
 }
 
 void CExceptionBase::BuildText(std::string_view module, std::u16string_view text,

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <exception>
 #include <initializer_list>
 #include <string>
 #include <string_view>
@@ -26,9 +27,14 @@ inline constexpr std::string_view kUnknownExceptionText =
     "Unknown exception. This is a critical error, please report this problem to Morvil support";
 
 // Content shared by CException and CUnknownException. Not thrown by itself; a
-// handler for it sees both families (the API boundary uses that).
-class CExceptionBase {
+// handler for it sees both families (the API boundary uses that). It is a
+// std::exception so that a handler that knows nothing of the family (a test
+// framework, a host's last resort) still reports the whole chain.
+class CExceptionBase : public std::exception {
  public:
+  // The whole chain, every level, in UTF-8.
+  const char* what() const noexcept override { return what_.c_str(); }
+
   const ErrorEntry& GetCurrentEntry() const { return current_; }
   const std::vector<ErrorEntry>& GetEntries() const { return entries_; }
   int32_t GetErrorNumber() const { return error_number_; }
@@ -51,11 +57,13 @@ class CExceptionBase {
 
  private:
   void AppendCurrentAndInner(const CExceptionBase* inner);
+  void RefreshWhat();
 
   ErrorEntry current_;
   std::vector<ErrorEntry> entries_;
   mutable std::u16string full_text_;
   std::u16string reserved_;
+  std::string what_;
   int32_t error_number_ = 1;
 };
 

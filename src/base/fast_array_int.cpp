@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <new>
 
+#include "base/error_numbers.h"
 #include "base/checked_allocation.h"
 #include "base/exception_family.h"
 
@@ -11,9 +12,10 @@ namespace qm {
 namespace {
 
 [[noreturn]] void AllocationFailed(const char* method) {
+  // Text kept as written: callers match on it. Do not correct.
   std::fputs("Error allocationg memory\n", stdout);
   std::fflush(stdout);
-  throw CCollectionException::Numbered(11, method, nullptr);
+  throw CCollectionException::Numbered(kErrOutOfMemory, method, nullptr);
 }
 
 }  // namespace

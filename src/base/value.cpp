@@ -260,6 +260,7 @@ void CColumnValues::AllocateColumns() {
     values_.resize(kMaxColumns + 1);
   } catch (const std::bad_alloc&) {
     values_.clear();
+    // Text kept as written: callers match on it. Do not correct.
     throw CValueException::Text("Eror allocating memory", "CColumnValues::AllocateColumns",
                                 nullptr);
   }

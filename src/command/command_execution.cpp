@@ -3,6 +3,8 @@
 #include <map>
 #include <optional>
 
+#include "base/error_numbers.h"
+#include "format/header_block_io.h"
 #include "command/command_locks.h"
 #include "command/command_translator.h"
 #include "command/command_type.h"
@@ -30,13 +32,8 @@ constexpr const char* kExecuteW = "ExecuteW";
 constexpr std::string_view kTraceTag = "PILIB.CPiStartPoint.ExecuteW";
 
 // Numbered errors of the command engine.
-constexpr int32_t kErrOptionsDoNotFit = 10;
-constexpr int32_t kErrUnknownCommand = 15;
-constexpr int32_t kErrConnectionFailed = 40;
-constexpr int32_t kErrGroupMissing = 41;
 
 // The bytes block 0 gives a header, its 6 header bytes included.
-constexpr int64_t kHeaderBlockLimit = 4095;
 
 // The general option bits an update cannot add to a findex built without them.
 constexpr int32_t kPostingLayoutBits = kIgoSupportScore | kIgoSupportPhrases;
@@ -44,8 +41,8 @@ constexpr int32_t kPostingLayoutBits = kIgoSupportScore | kIgoSupportPhrases;
 // Holds one per-command writer lock for a scope.
 class CommandLock {
  public:
-  CommandLock(int32_t command_type, std::string_view object_name)
-      : lock_(CommandLockName(command_type, ToUpper(object_name))) {
+  CommandLock(const CGlobalDefs& defs, int32_t command_type, std::string_view object_name)
+      : lock_(defs.GetLockScope(), CommandLockName(command_type, ToUpper(object_name))) {
     lock_.LockWriter();
   }
 
@@ -78,7 +75,7 @@ void RequireFitsHeaderBlock(Definition probe, const CGlobalDefs& defs, std::stri
     throw CPiStartPointException::Text(
         "The %s definition is too long: its header needs %i bytes and block 0 holds %i. Use a "
         "shorter SELECT, fewer columns or shorter tags",
-        method, nullptr, what, probe.EncodedSize(), kHeaderBlockLimit);
+        method, nullptr, what, probe.EncodedSize(), header_io::kMaxEncodedSize);
   }
 }
 
@@ -152,7 +149,7 @@ std::string SourceText(const CIndexHeader& h) {
 void RequireUpdatableBy(const CIndexHeader& asked, const CIndexHeader& existing) {
   const int32_t missing_bits = asked.GeneralFlags & kPostingLayoutBits & ~existing.GeneralFlags;
   if (missing_bits != 0) {
-    throw CPiStartPointException::Numbered(kErrOptionsDoNotFit, kExecuteW, nullptr);
+    throw CPiStartPointException::Numbered(kErrOptionsDoNotMatch, kExecuteW, nullptr);
   }
   const bool same_source =
       asked.SqlUsedAsTable == existing.SqlUsedAsTable &&
@@ -170,7 +167,7 @@ void RequireUpdatableBy(const CIndexHeader& asked, const CIndexHeader& existing)
       kExecuteW, nullptr, SourceText(asked), asked.KeyColumn, ColumnsWithTags(asked.Columns),
       existing.IndexName, SourceText(existing), existing.KeyColumn,
       ColumnsWithTags(existing.Columns));
-  throw CPiStartPointException::Numbered(kErrOptionsDoNotFit, kExecuteW, &cause);
+  throw CPiStartPointException::Numbered(kErrOptionsDoNotMatch, kExecuteW, &cause);
 }
 
 CommandExecution::CommandExecution(CGlobalDefs& defs, std::atomic<bool>& data_path_valid,
@@ -227,7 +224,7 @@ void CommandExecution::Execute(Command& command) {
     case kCmdDropOrder: DropOrder(command.order.OrderName); return;
     case kCmdDeleteKey: DeleteKey(command); return;
     case kCmdPassThroughSql: RunPassThroughSql(command); return;
-    default: throw CPiStartPointException::Numbered(kErrUnknownCommand, kExecuteW, nullptr);
+    default: throw CPiStartPointException::Numbered(kErrNoCommand, kExecuteW, nullptr);
   }
 }
 
@@ -243,7 +240,7 @@ void CommandExecution::TestConnection(const Command& command) {
     database.Connect();
     database.Disconnect();
   } catch (const CExceptionBase& e) {
-    throw CPiStartPointException::Numbered(kErrConnectionFailed, kExecuteW, &e);
+    throw CPiStartPointException::Numbered(kErrConnectionSettings, kExecuteW, &e);
   }
 }
 
@@ -272,7 +269,7 @@ void CommandExecution::BuildFindex(Command& command) {
   RequireBuildableFindex(definition, defs_, kExecuteW);
   RequireDataPathValid();
   const std::string name = definition.IndexName;
-  const CommandLock lock(command.type, name);
+  const CommandLock lock(defs_, command.type, name);
 
   const bool stored = command.type == kCmdFindexStored;
   const bool update = command.create == 0;
@@ -330,7 +327,7 @@ void CommandExecution::BuildFindex(Command& command) {
     definition.MaxDateTimeKey = DateTimeValue{};
     // It forgets the deleted keys once it is in place: a DELETE waits until
     // then, or a key deleted after its rows were read would be lost.
-    delete_lock.emplace(kCmdDeleteKey, name);
+    delete_lock.emplace(defs_, kCmdDeleteKey, name);
   }
   Trace(defs_.TraceLevel1(), kTraceTag, "Status 2. IndexBuildName: %s, Rebuild: %i, SortMax: %i",
         definition.IndexName, rebuild ? 1 : 0, definition.SortMax);
@@ -343,7 +340,7 @@ void CommandExecution::BuildOrder(Command& command) {
   RequireBuildableOrder(definition, defs_, kExecuteW);
   RequireDataPathValid();
   const std::string name = definition.OrderName;
-  const CommandLock lock(command.type, name);
+  const CommandLock lock(defs_, command.type, name);
   const bool rebuild = command.rebuild != 0;
   if (command.type == kCmdOrderStored) {
     // CREATE ORDER name and UPDATE ORDER name work from the stored definition,
@@ -372,13 +369,13 @@ void CommandExecution::BuildOrder(Command& command) {
 
 void CommandExecution::DropFindex(const std::string& name) {
   RequirePlainName<CPiStartPointException>("findex", name, kExecuteW);
-  const CommandLock drop_lock(kCmdDropFindex, name);
+  const CommandLock drop_lock(defs_, kCmdDropFindex, name);
   // A drop never races a build of the same findex, nor a search of it.
-  const CommandLock create_lock(kCmdFindexDefined, name);
+  const CommandLock create_lock(defs_, kCmdFindexDefined, name);
   const std::string group = defs_.GetGroup();
-  CLockManager findex_lock(group, name, kLockFindex);
+  CLockManager findex_lock(defs_.GetLockScope(), group, name, kLockFindex);
   findex_lock.LockExclusive();
-  CLockManager deleted_keys_lock(group, name, kLockDeletedKeys);
+  CLockManager deleted_keys_lock(defs_.GetLockScope(), group, name, kLockDeletedKeys);
   deleted_keys_lock.LockExclusive();
   // Whatever files are there go, damaged ones too: a findex that no longer
   // opens must still be removable.
@@ -388,10 +385,10 @@ void CommandExecution::DropFindex(const std::string& name) {
 
 void CommandExecution::DropOrder(const std::string& name) {
   RequirePlainName<CPiStartPointException>("order", name, kExecuteW);
-  const CommandLock drop_lock(kCmdDropOrder, name);
+  const CommandLock drop_lock(defs_, kCmdDropOrder, name);
   // A drop never races a build of the same order; searches are waited for
   // under the order's kind 3 lock, which DropOrder takes.
-  const CommandLock order_lock(kCmdOrderDefined, name);
+  const CommandLock order_lock(defs_, kCmdOrderDefined, name);
   // Whatever files are there go, damaged ones too.
   CPiOrder order(defs_);
   order.DropOrderFiles(name);
@@ -407,7 +404,7 @@ void CommandExecution::DeleteKey(const Command& command) {
         "Cannot delete key %i from findex %s: deleted keys must be 1 or above", kExecuteW,
         nullptr, command.delete_key, name);
   }
-  const CommandLock lock(kCmdDeleteKey, name);
+  const CommandLock lock(defs_, kCmdDeleteKey, name);
   // A key deleted from a findex that is not there would be reported done
   // while no search ever subtracts it.
   if (!FindexFilesExist(defs_, name)) {

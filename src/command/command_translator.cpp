@@ -4,6 +4,7 @@
 #include <limits>
 #include <optional>
 
+#include "base/error_numbers.h"
 #include "command/findex_column_parser.h"
 #include "command/order_column_parser.h"
 #include "command/quoted_text.h"
@@ -22,11 +23,6 @@ constexpr std::string_view kTagSplit = "PILIB.cmd.SplitStrW";
 constexpr std::string_view kTagTranslate = "PILIB.cmd.TranslateW";
 
 // Numbered errors of the command language.
-constexpr int32_t kErrWordMissing = 13;
-constexpr int32_t kErrEmptyStatement = 15;
-constexpr int32_t kErrExtraWords = 16;
-constexpr int32_t kErrOnOrRebuild = 18;
-constexpr int32_t kErrDeleteKey = 46;
 
 CPiCmdException Numbered(int32_t number) {
   return CPiCmdException::Numbered(number, kTranslateW, nullptr);
@@ -118,7 +114,7 @@ bool PiCmd::IsKeyword(std::size_t i, std::u16string_view keyword) const {
 }
 
 void PiCmd::RequireWord(std::size_t i) const {
-  if (i >= words_.size()) throw Numbered(kErrWordMissing);
+  if (i >= words_.size()) throw Numbered(kErrCommandSyntax);
 }
 
 void PiCmd::Translate(std::u16string_view statement) {
@@ -138,13 +134,13 @@ void PiCmd::Translate(std::u16string_view statement) {
     Trace(true, kTagTranslate, "Translating. Statement: %s, Words: %i",
           Narrow(MaskStatementForTrace(normalized)), words_.size());
   }
-  if (words_.empty()) throw Numbered(kErrEmptyStatement);
+  if (words_.empty()) throw Numbered(kErrNoCommand);
 
   const bool create_or_update = IsKeyword(0, u"CREATE") || IsKeyword(0, u"UPDATE");
   // The pass-through SQL goes to the data source as written; its quotes are
   // the data source's business.
   if (unterminated_quote_ && !(create_or_update && IsKeyword(1, u"INDEX"))) {
-    throw Numbered(kErrWordMissing);
+    throw Numbered(kErrCommandSyntax);
   }
   if (create_or_update) {
     TranslateCreateOrUpdate(statement);
@@ -193,7 +189,7 @@ PiCmd::DefinitionWords PiCmd::ReadDefinitionWords() {
   const std::size_t n = words_.size();
   std::size_t key_at = 7;
   while (key_at < n && !IsKeyword(key_at, u"KEY")) ++key_at;
-  if (key_at + 1 >= n) throw Numbered(kErrWordMissing);  // no KEY, or nothing after it
+  if (key_at + 1 >= n) throw Numbered(kErrCommandSyntax);  // no KEY, or nothing after it
   for (std::size_t i = 7; i < key_at; ++i) words.columns += words_[i];
   words.key = words_[key_at + 1];
 
@@ -205,55 +201,51 @@ PiCmd::DefinitionWords PiCmd::ReadDefinitionWords() {
   return words;
 }
 
-void PiCmd::TranslateFindex() {
+// The opening FINDEX and ORDER definitions share: NAME alone or NAME REBUILD
+// take the stored definition (stored_type); NAME ON TABLE ... KEY ... reads a
+// new one into definition and returns its words. not_on makes the error for
+// anything else after the name.
+template <class Definition, class NotOn>
+std::optional<PiCmd::DefinitionWords> PiCmd::ReadDefinitionOpening(
+    Definition& definition, std::string& name, std::string_view spaces_message,
+    int32_t stored_type, NotOn not_on) {
   RequireWord(2);
-  RequireNameWithoutSpaces(words_[2], kSpacesInIndexName, kTranslateW);
-  findex_.IndexName = Narrow(words_[2]);
+  RequireNameWithoutSpaces(words_[2], spaces_message, kTranslateW);
+  name = Narrow(words_[2]);
   const std::size_t n = words_.size();
-  if (n == 3) {
-    cmd_type_ = kCmdFindexStored;
-    return;
+  if (n == 3 || IsKeyword(3, u"REBUILD")) {
+    if (n != 3) {
+      if (n != 4) throw Numbered(kErrCommandSyntax);
+      rebuild_ = 1;
+    }
+    cmd_type_ = stored_type;
+    return std::nullopt;
   }
-  if (IsKeyword(3, u"REBUILD")) {
-    if (n != 4) throw Numbered(kErrWordMissing);
-    rebuild_ = 1;
-    cmd_type_ = kCmdFindexStored;
-    return;
-  }
-  if (!IsKeyword(3, u"ON")) throw Numbered(kErrOnOrRebuild);
+  if (!IsKeyword(3, u"ON")) throw not_on();
 
-  const DefinitionWords words = ReadDefinitionWords();
-  findex_.TableName = Narrow(words.table);
-  findex_.SqlUsedAsTable = 0;
-  findex_.SqlSelect.clear();
-  ParseFindexColumns(words.columns, findex_.Columns, kTranslateW);
-  findex_.KeyColumn = Narrow(words.key);
+  DefinitionWords words = ReadDefinitionWords();
+  definition.TableName = Narrow(words.table);
+  definition.SqlUsedAsTable = 0;
+  definition.SqlSelect.clear();
+  definition.KeyColumn = Narrow(words.key);
+  return words;
+}
+
+void PiCmd::TranslateFindex() {
+  const auto words = ReadDefinitionOpening(findex_, findex_.IndexName, kSpacesInIndexName,
+                                           kCmdFindexStored,
+                                           [] { return Numbered(kErrOnOrRebuild); });
+  if (!words) return;
+  ParseFindexColumns(words->columns, findex_.Columns, kTranslateW);
   cmd_type_ = kCmdFindexDefined;
 }
 
 void PiCmd::TranslateOrder() {
-  RequireWord(2);
-  RequireNameWithoutSpaces(words_[2], kSpacesInOrderName, kTranslateW);
-  order_.OrderName = Narrow(words_[2]);
-  const std::size_t n = words_.size();
-  if (n == 3) {
-    cmd_type_ = kCmdOrderStored;
-    return;
-  }
-  if (IsKeyword(3, u"REBUILD")) {
-    if (n != 4) throw Numbered(kErrWordMissing);
-    rebuild_ = 1;
-    cmd_type_ = kCmdOrderStored;
-    return;
-  }
-  if (!IsKeyword(3, u"ON")) throw TextError("Expected keyword <ON>");
-
-  const DefinitionWords words = ReadDefinitionWords();
-  order_.TableName = Narrow(words.table);
-  order_.SqlUsedAsTable = 0;
-  order_.SqlSelect.clear();
-  ParseOrderColumns(words.columns, order_.Columns, kTranslateW);
-  order_.KeyColumn = Narrow(words.key);
+  const auto words = ReadDefinitionOpening(order_, order_.OrderName, kSpacesInOrderName,
+                                           kCmdOrderStored,
+                                           [] { return TextError("Expected keyword <ON>"); });
+  if (!words) return;
+  ParseOrderColumns(words->columns, order_.Columns, kTranslateW);
   cmd_type_ = kCmdOrderDefined;
 }
 
@@ -289,7 +281,7 @@ void PiCmd::TranslateSet() {
   RequireWord(1);
   RequireWord(2);
   const bool group = IsKeyword(1, u"GROUP");
-  if (!group && !IsKeyword(1, u"CONNECTIONSTRING")) throw Numbered(kErrWordMissing);
+  if (!group && !IsKeyword(1, u"CONNECTIONSTRING")) throw Numbered(kErrCommandSyntax);
   // A value with blanks must be quoted; the words after an unquoted one would
   // otherwise be lost without notice.
   if (words_.size() > 3) throw Numbered(kErrExtraWords);
@@ -307,9 +299,9 @@ void PiCmd::TranslateSet() {
 
 void PiCmd::TranslateDelete() {
   RequireWord(1);
-  if (!IsKeyword(1, u"FROM")) throw Numbered(kErrWordMissing);
+  if (!IsKeyword(1, u"FROM")) throw Numbered(kErrCommandSyntax);
   RequireWord(2);
-  if (!IsKeyword(2, u"FINDEX")) throw Numbered(kErrWordMissing);
+  if (!IsKeyword(2, u"FINDEX")) throw Numbered(kErrCommandSyntax);
   RequireWord(3);
   findex_.IndexName = Narrow(words_[3]);
   RequireWord(4);

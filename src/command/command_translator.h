@@ -6,6 +6,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -66,6 +67,10 @@ class PiCmd {
   };
   // Words 4 on of "... ON TABLE t COLUMNS c KEY k [REBUILD]"; sets Rebuild.
   DefinitionWords ReadDefinitionWords();
+  template <class Definition, class NotOn>
+  std::optional<DefinitionWords> ReadDefinitionOpening(Definition& definition, std::string& name,
+                                                       std::string_view spaces_message,
+                                                       int32_t stored_type, NotOn not_on);
 
   bool IsKeyword(std::size_t i, std::u16string_view keyword) const;
   // Raises error 13 when the statement ends before word i.

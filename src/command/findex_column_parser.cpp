@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <iterator>
 
+#include "base/error_numbers.h"
 #include "command/quoted_text.h"
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
@@ -12,7 +13,6 @@ namespace qm {
 
 namespace {
 
-constexpr int32_t kColumnListRejected = 17;
 
 std::string CleanName(std::u16string_view text) {
   return Utf16ToUtf8(UnquoteValue(TrimSpaces(text)));
@@ -42,7 +42,7 @@ void RequireKnownTag(const std::string& column, const std::string& tag, const st
 }  // namespace
 
 void ParseFindexColumns(std::u16string_view columns, ColumnMap& column_map, const char* method) {
-  auto reject = [method] { return CPiCmdException::Numbered(kColumnListRejected, method, nullptr); };
+  auto reject = [method] { return CPiCmdException::Numbered(kErrColumnList, method, nullptr); };
   ColumnMap parsed = Guard<CPiCmdException, CPiCmdUnknownException>("InsertIndexTags", [&] {
     ColumnMap result;
     bool unterminated = false;

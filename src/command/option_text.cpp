@@ -89,26 +89,4 @@ std::string SeparatorText(std::u16string_view separators) {
   return Utf16ToUtf8(shown);
 }
 
-IndexOptions IndexOptionsOf(const CIndexHeader& header) {
-  IndexOptions options;
-  options.Language = header.Language;
-  options.LanguageFlags = header.LanguageFlags;
-  options.GeneralFlags = header.GeneralFlags;
-  options.IndexMaxSize = header.IndexMaxSize;
-  options.IndexStartValue = header.IndexStartValue;
-  options.Separators = header.Separators;
-  options.UpdateFlags = header.UpdateFlags;
-  options.UpdateSupport = header.UpdateSupport;
-  return options;
-}
-
-OrderOptions OrderOptionsOf(const COrderInfo& info) {
-  OrderOptions options;
-  options.GeneralFlags = info.GeneralFlags;
-  options.IgnoreChars = info.IgnoreChars;
-  options.UpdateFlags = info.UpdateFlags;
-  options.UpdateSupport = info.UpdateSupport;
-  return options;
-}
-
 }  // namespace qm

@@ -26,8 +26,4 @@ std::string OrderUpdateOptionText(const OrderOptions& options, int32_t option);
 // as "<SPACE>", "<NEW_LINE>", "<LINE_FEED>" and "<TAB>".
 std::string SeparatorText(std::u16string_view separators);
 
-// The options a findex or an order was built with.
-IndexOptions IndexOptionsOf(const CIndexHeader& header);
-OrderOptions OrderOptionsOf(const COrderInfo& info);
-
 }  // namespace qm

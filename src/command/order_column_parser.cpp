@@ -1,5 +1,6 @@
 #include "command/order_column_parser.h"
 
+#include "base/error_numbers.h"
 #include "command/quoted_text.h"
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
@@ -7,12 +8,11 @@
 namespace qm {
 
 namespace {
-constexpr int32_t kColumnListRejected = 17;
 }  // namespace
 
 void ParseOrderColumns(std::u16string_view list, OrderColumnList& columns, const char* method) {
   auto reject = [method] {
-    return CPiCmdException::Numbered(kColumnListRejected, method, nullptr);
+    return CPiCmdException::Numbered(kErrColumnList, method, nullptr);
   };
   OrderColumnList parsed = Guard<CPiCmdException, CPiCmdUnknownException>("InsertIndexTags", [&] {
     OrderColumnList result;

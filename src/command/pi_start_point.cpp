@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <functional>
+#include <type_traits>
 #include <utility>
 
+#include "base/error_numbers.h"
 #include "command/command_execution.h"
 #include "command/command_translator.h"
 #include "command/findex_column_parser.h"
@@ -29,7 +31,6 @@ constexpr std::string_view kExecuteTag = "PILIB.CPiStartPoint.ExecuteW";
 constexpr std::string_view kJobTag = "PILIB.CPiStartPoint.ThreadFunc";
 constexpr std::string_view kBannerFrame = "************************************";
 
-constexpr int32_t kErrConnectToDatabase = 31;
 
 constexpr const char16_t* kUnknownInThreadFunc = u"Unknown Exception in ThreadFunc";
 // Background CreateFindex and CreateOrder jobs report with one text.
@@ -464,51 +465,46 @@ void CPiStartPoint::SetOrderUpdateOptions(int32_t update_support, bool use_date_
 }
 
 IndexOptions CPiStartPoint::StoredIndexOptions(const char* method) {
-  return IndexOptionsOf(ReadFindexHeaderShared(defs_, CurrentObjectName(method)));
+  return IndexOptions::FromHeader(ReadFindexHeaderShared(defs_, CurrentObjectName(method)));
 }
 
 OrderOptions CPiStartPoint::StoredOrderOptions(const char* method) {
-  return OrderOptionsOf(order_files::ReadInfoShared(defs_, CurrentObjectName(method)));
+  return OrderOptions::FromInfo(order_files::ReadInfoShared(defs_, CurrentObjectName(method)));
+}
+
+// One option of the current options (get_default_value) or of those the
+// current object was built with, rendered by render.
+template <class Options>
+std::string CPiStartPoint::OptionText(const char* method,
+                                      std::string (*render)(const Options&, int32_t),
+                                      int32_t option, bool get_default_value) {
+  return Public(method, [&] {
+    if constexpr (std::is_same_v<Options, IndexOptions>) {
+      return render(get_default_value ? CurrentIndexOptions() : StoredIndexOptions(method), option);
+    } else {
+      return render(get_default_value ? CurrentOrderOptions() : StoredOrderOptions(method), option);
+    }
+  });
 }
 
 std::string CPiStartPoint::GetIndexLanguageOption(int32_t option, bool get_default_value) {
-  constexpr const char* kMethod = "GetIndexLanguageOption";
-  return Public(kMethod, [&] {
-    return IndexLanguageOptionText(
-        get_default_value ? CurrentIndexOptions() : StoredIndexOptions(kMethod), option);
-  });
+  return OptionText("GetIndexLanguageOption", &IndexLanguageOptionText, option, get_default_value);
 }
 
 std::string CPiStartPoint::GetIndexGeneralOption(int32_t option, bool get_default_value) {
-  constexpr const char* kMethod = "GetIndexGeneralOption";
-  return Public(kMethod, [&] {
-    return IndexGeneralOptionText(
-        get_default_value ? CurrentIndexOptions() : StoredIndexOptions(kMethod), option);
-  });
+  return OptionText("GetIndexGeneralOption", &IndexGeneralOptionText, option, get_default_value);
 }
 
 std::string CPiStartPoint::GetIndexUpdateOption(int32_t option, bool get_default_value) {
-  constexpr const char* kMethod = "GetIndexUpdateOption";
-  return Public(kMethod, [&] {
-    return IndexUpdateOptionText(
-        get_default_value ? CurrentIndexOptions() : StoredIndexOptions(kMethod), option);
-  });
+  return OptionText("GetIndexUpdateOption", &IndexUpdateOptionText, option, get_default_value);
 }
 
 std::string CPiStartPoint::GetOrderGeneralOption(int32_t option, bool get_default_value) {
-  constexpr const char* kMethod = "GetOrderGeneralOption";
-  return Public(kMethod, [&] {
-    return OrderGeneralOptionText(
-        get_default_value ? CurrentOrderOptions() : StoredOrderOptions(kMethod), option);
-  });
+  return OptionText("GetOrderGeneralOption", &OrderGeneralOptionText, option, get_default_value);
 }
 
 std::string CPiStartPoint::GetOrderUpdateOption(int32_t option, bool get_default_value) {
-  constexpr const char* kMethod = "GetOrderUpdateOption";
-  return Public(kMethod, [&] {
-    return OrderUpdateOptionText(
-        get_default_value ? CurrentOrderOptions() : StoredOrderOptions(kMethod), option);
-  });
+  return OptionText("GetOrderUpdateOption", &OrderUpdateOptionText, option, get_default_value);
 }
 
 void CPiStartPoint::LoadDefaultIndexOptions() {

@@ -143,6 +143,9 @@ class CPiStartPoint {
   void SetError(int32_t flag, std::u16string message);
   void ClearErrorFlag();
   void JoinFinishedJobs();
+  template <class Options>
+  std::string OptionText(const char* method, std::string (*render)(const Options&, int32_t),
+                         int32_t option, bool get_default_value);
   IndexOptions StoredIndexOptions(const char* method);
   OrderOptions StoredOrderOptions(const char* method);
 

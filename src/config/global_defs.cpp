@@ -88,12 +88,9 @@ std::string ExpandEach(const CGlobalDefs& defs, std::string text,
 
 }  // namespace
 
-CGlobalDefs::CGlobalDefs() {
-  const TraceLevels levels = InitTraceLevels();
-  trace1_ = levels.level1;
-  trace2_ = levels.level2;
-  trace3_ = levels.level3;
-}
+// Each new settings object reads the trace level file again, so a changed
+// level reaches the next engine without a restart.
+CGlobalDefs::CGlobalDefs() { InitTraceLevels(); }
 
 CGlobalDefs::CGlobalDefs(const CGlobalDefs& other) { *this = other; }
 
@@ -124,9 +121,6 @@ CGlobalDefs& CGlobalDefs::operator=(const CGlobalDefs& other) {
   password_ = other.password_;
   mode_ = other.mode_;
   connection_set_ = other.connection_set_;
-  trace1_ = other.trace1_;
-  trace2_ = other.trace2_;
-  trace3_ = other.trace3_;
   return *this;
 }
 
@@ -223,6 +217,12 @@ std::string CGlobalDefs::GetDataPath() const {
   return data_path_;
 }
 
+std::string CGlobalDefs::GetLockScope() const {
+  std::string root = GetDataPath();
+  if (root.empty()) platform::ReadConfigValue("path", root);
+  return root;
+}
+
 void CGlobalDefs::SetGroup(std::string_view group) {
   std::lock_guard lock(mutex_);
   group_ = group;
@@ -245,7 +245,7 @@ void CGlobalDefs::SetConnectionDsn(std::string_view dsn, std::string_view user,
     mode_ = ConnectionMode::Dsn;
     connection_set_ = true;
   }
-  Trace(trace1_, "PILIB,FILIB.(SHARELIB)CGlobalDefs.set_connection", "Connection set: DSN; %s",
+  Trace(TraceLevel1(), "PILIB,FILIB.(SHARELIB)CGlobalDefs.set_connection", "Connection set: DSN; %s",
         dsn);
 }
 

@@ -9,6 +9,7 @@
 #include <string>
 #include <string_view>
 
+#include "base/trace.h"
 #include "base/connection_scramble.h"
 
 namespace qm {
@@ -90,6 +91,9 @@ class CGlobalDefs {
   // --- data path and group ---
   void SetDataPath(std::string_view path);
   std::string GetDataPath() const;
+  // The scope of the named locks on this data directory's files: its root
+  // folder, or empty (the lock folder's root) when no data path is set.
+  std::string GetLockScope() const;
   void SetGroup(std::string_view group);
   std::string GetGroup() const;
 
@@ -112,10 +116,11 @@ class CGlobalDefs {
   // "DB=", upper-cased; "No Display Name" when neither occurs.
   static std::string DisplayNameOf(std::string_view connection_string);
 
-  // --- trace flags read at construction ---
-  bool TraceLevel1() const { return trace1_; }
-  bool TraceLevel2() const { return trace2_; }
-  bool TraceLevel3() const { return trace3_; }
+  // --- trace flags: the process-wide ones (base/trace.h), the one source of
+  // truth, as the last settings object constructed read them ---
+  bool TraceLevel1() const { return qm::TraceLevel1.load(std::memory_order_relaxed); }
+  bool TraceLevel2() const { return qm::TraceLevel2.load(std::memory_order_relaxed); }
+  bool TraceLevel3() const { return qm::TraceLevel3.load(std::memory_order_relaxed); }
 
   static constexpr const char* kVersionText = "6.14";
   static constexpr int32_t kVersion = 614;
@@ -142,9 +147,6 @@ class CGlobalDefs {
   std::string password_;
   ConnectionMode mode_ = ConnectionMode::Dsn;
   bool connection_set_ = false;
-  bool trace1_ = false;
-  bool trace2_ = false;
-  bool trace3_ = false;
 };
 
 }  // namespace qm

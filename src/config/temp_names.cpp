@@ -30,7 +30,8 @@ std::string SLGetTempFileName(const CGlobalDefs& defs, bool group_scope, int32_t
   return Guard<CSTDFUNException>(kMethod, [&] {
     const std::string folder = group_scope ? defs.GetFullDataPath(FolderKind::GroupConfig)
                                            : defs.GetHomePathRequired(FolderKind::HomeConfig, kMethod);
-    CLockManager lock(group_scope ? defs.GetGroup() : std::string("home"), "generator",
+    // The counter file's own folder scopes its lock.
+    CLockManager lock(folder, group_scope ? defs.GetGroup() : std::string("home"), "generator",
                       kLockGenerator);
     int32_t counter = 1;
     std::optional<CWinFileException> write_failure;

@@ -12,6 +12,18 @@ namespace qm {
 
 class CGlobalDefs;
 
+// The caller numbers in temporary names: they tell whose file a left-over
+// temporary was, so each kind of file keeps its number.
+enum TempNameCaller : int32_t {
+  kTempCallerFindexFiles = 5,        // a findex build's .sdx/.fst before the swap
+  kTempCallerOrderFiles = 6,         // an order build's files before the swap
+  kTempCallerOptionFiles = 9,        // an option file before its rename
+  kTempCallerSortRuns = 44,          // the sort's entry files
+  kTempCallerBinaryColumn = 81,      // a binary column value copied to a work file
+  kTempCallerConverterOutput = 83,   // what an external converter writes
+  kTempCallerDocument = 84,          // a fetched or copied document
+};
+
 // Group scope: the group's generator.dat; home scope: the home's (raises
 // STDFUN "Home path is not set" when no home is configured).
 std::string SLGetTempFileName(const CGlobalDefs& defs, bool group_scope, int32_t caller);

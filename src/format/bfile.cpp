@@ -50,6 +50,7 @@ int64_t BFile::BlockCount() const {
 void BFile::CheckSize(const CBlock& block, const char* method) const {
   block.RequireOpen(method);
   if (block.Size() != block_size_) {
+    // Text kept as written: callers match on it. Do not correct.
     throw CBFileException::Text("Block size missmatch", method, nullptr);
   }
 }

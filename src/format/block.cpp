@@ -45,6 +45,7 @@ const char* ReadValueMessage(VALUE_TYPE type) {
 CBlock::CBlock(int32_t units) {
   const int64_t size = static_cast<int64_t>(units) * kUnitBytes;
   auto failure = [size] {
+    // "Blobk" (the method) is kept as written: callers match on it. Do not correct.
     return CBlockException::Text("Could not allocate memory size: %i", "Blobk", nullptr, size + 4);
   };
   if (units < 1 || units > kMaxUnits) throw failure();
@@ -495,19 +496,18 @@ void CBlock::ReadValue(CValue& value) { ReadValueView(value.GetType()).CopyTo(va
 
 // --- free space ---
 
-bool CBlock::IsFreeRowLeaf(const CValue& key) {
-  RequireOpen("IsFreeRowLeaf");
+// Leaf rows (value, item position) and node rows (value, child block) need
+// the same room, so one rule answers for both.
+bool CBlock::HasRoomForRow(const CValue& key, const char* method) {
+  RequireOpen(method);
   const int64_t n = ValueBytes(key);
-  if (n < 0) UnrecognizedType("IsFreeRowLeaf", key);
+  if (n < 0) UnrecognizedType(method, key);
   return used_ + n + 6 < size_;
 }
 
-bool CBlock::IsFreeRowNode(const CValue& key) {
-  RequireOpen("IsFreeRowNode");
-  const int64_t n = ValueBytes(key);
-  if (n < 0) UnrecognizedType("IsFreeRowNode", key);
-  return used_ + n + 6 < size_;
-}
+bool CBlock::IsFreeRowLeaf(const CValue& key) { return HasRoomForRow(key, "IsFreeRowLeaf"); }
+
+bool CBlock::IsFreeRowNode(const CValue& key) { return HasRoomForRow(key, "IsFreeRowNode"); }
 
 // --- searches ---
 

@@ -156,6 +156,7 @@ class CBlock {
   int32_t GetNodeChildId(const CValue& key);
 
  private:
+  bool HasRoomForRow(const CValue& key, const char* method);
   // Raises the insert failure: always-written trace line under
   // "SHARELIB_ERROR.Block.<method>" with the message, then a "Block" error.
   [[noreturn]] void InsertFailure(const char* method, std::string_view message) const;

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "base/error_numbers.h"
 #include "format/bfile.h"
 #include "base/exception_family.h"
 #include "base/trace.h"
@@ -80,7 +81,7 @@ void CFindexTreeWriter::AddChild(int level, int32_t child, const CValue& separat
   if (!NodeTakes(node, separator)) {
     if (level == kRoot || node.empty) {
       Trace(true, kErrorTag, "Block size too small, aborting");
-      throw CPiFIndexException::Numbered(29, kMethod, nullptr);
+      throw CPiFIndexException::Numbered(kErrWordTreeFull, kMethod, nullptr);
     }
     WriteAt(node.block, node.number);
     AddChild(level - 1, node.number, node.last);

@@ -28,6 +28,13 @@ namespace qm::header_io {
 inline constexpr int64_t kHeaderBlockUnits = 64;
 inline constexpr int64_t kMaxEncodedSize = kHeaderBlockUnits * CBlock::kUnitBytes - 1;
 
+// Files of format versions 601 (this engine's) up to 700 are read; later
+// major formats are refused before any later field is read.
+inline constexpr int32_t kLastReadableFileVersion = 700;
+inline bool IsReadableFileVersion(int32_t version) {
+  return version >= CGlobalDefs::kFileVersion && version <= kLastReadableFileVersion;
+}
+
 class Writer {
  public:
   static constexpr bool kReads = false;
@@ -88,10 +95,9 @@ class Reader {
   void Str(std::string& text) { block_.ReadStr(text); }
   void StrW(std::u16string& text) { block_.ReadStrW(text); }
   void Date(DateTimeValue& d) { d = block_.ReadDate(); }
-  // Versions outside 601..700 are refused before any later field is read.
   void Version(int32_t& v) {
     v = block_.ReadInt();
-    if (v <= CGlobalDefs::kFileVersion - 1 || v >= 701) {
+    if (!IsReadableFileVersion(v)) {
       throw CHighStructuresException::Text(version_text_, "ReadHeader", nullptr,
                                            CGlobalDefs::kVersionText,
                                            std::to_string(CGlobalDefs::kFileVersion));

@@ -44,15 +44,28 @@ struct IndexOptions {
   int32_t UpdateFlags = 0;
   int32_t UpdateSupport = 0;
 
+  // The options a findex was built with.
+  static IndexOptions FromHeader(const CIndexHeader& header) {
+    IndexOptions options;
+    Fields(options, header, [](auto& to, const auto& from) { to = from; });
+    return options;
+  }
   void CopyTo(CIndexHeader& definition) const {
-    definition.Language = Language;
-    definition.LanguageFlags = LanguageFlags;
-    definition.GeneralFlags = GeneralFlags;
-    definition.IndexMaxSize = IndexMaxSize;
-    definition.IndexStartValue = IndexStartValue;
-    definition.Separators = Separators;
-    definition.UpdateFlags = UpdateFlags;
-    definition.UpdateSupport = UpdateSupport;
+    Fields(*this, definition, [](const auto& from, auto& to) { to = from; });
+  }
+
+ private:
+  // The one list of the fields options and header share: op(option, field).
+  template <class Options, class Header, class Op>
+  static void Fields(Options& o, Header& h, Op op) {
+    op(o.Language, h.Language);
+    op(o.LanguageFlags, h.LanguageFlags);
+    op(o.GeneralFlags, h.GeneralFlags);
+    op(o.IndexMaxSize, h.IndexMaxSize);
+    op(o.IndexStartValue, h.IndexStartValue);
+    op(o.Separators, h.Separators);
+    op(o.UpdateFlags, h.UpdateFlags);
+    op(o.UpdateSupport, h.UpdateSupport);
   }
 };
 
@@ -62,11 +75,23 @@ struct OrderOptions {
   int32_t UpdateFlags = 0;
   int32_t UpdateSupport = 0;
 
+  // The options an order was built with.
+  static OrderOptions FromInfo(const COrderInfo& info) {
+    OrderOptions options;
+    Fields(options, info, [](auto& to, const auto& from) { to = from; });
+    return options;
+  }
   void CopyTo(COrderInfo& definition) const {
-    definition.GeneralFlags = GeneralFlags;
-    definition.IgnoreChars = IgnoreChars;
-    definition.UpdateFlags = UpdateFlags;
-    definition.UpdateSupport = UpdateSupport;
+    Fields(*this, definition, [](const auto& from, auto& to) { to = from; });
+  }
+
+ private:
+  template <class Options, class Info, class Op>
+  static void Fields(Options& o, Info& i, Op op) {
+    op(o.GeneralFlags, i.GeneralFlags);
+    op(o.IgnoreChars, i.IgnoreChars);
+    op(o.UpdateFlags, i.UpdateFlags);
+    op(o.UpdateSupport, i.UpdateSupport);
   }
 };
 

@@ -6,6 +6,7 @@
 #include <cstring>
 #include <new>
 
+#include "base/error_numbers.h"
 #include "base/byte_layout.h"
 #include "base/checked_allocation.h"
 #include "base/exception_family.h"
@@ -225,7 +226,7 @@ void CItems::InsertItem(std::span<const int32_t> row) {
   }
   if (count_ == capacity_ && !GrowFor(count_)) {
     ReportAllocationFailure();
-    throw CFreeItemException::Numbered(11, "CItems::InsertItem", nullptr);
+    throw CFreeItemException::Numbered(kErrOutOfMemory, "CItems::InsertItem", nullptr);
   }
   std::memcpy(Row(count_), row.data(), static_cast<std::size_t>(RowSize()));
   ++count_;
@@ -237,7 +238,7 @@ void CItems::SetItem(int32_t index, std::span<const int32_t> row) {
   }
   if (!GrowFor(index)) {
     ReportAllocationFailure();
-    throw CFreeItemException::Numbered(11, "CItems::SetItem", nullptr);
+    throw CFreeItemException::Numbered(kErrOutOfMemory, "CItems::SetItem", nullptr);
   }
   RaiseCountTo(index + 1);
   std::memcpy(Row(index), row.data(), static_cast<std::size_t>(RowSize()));
@@ -324,7 +325,7 @@ void CItems::SortByKey() {
     ReserveChecked(scratch, n * w);
     scratch.resize(n * w);
   } catch (const std::bad_alloc&) {
-    throw CFreeItemException::Numbered(11, "CItems::SortByKey", nullptr);
+    throw CFreeItemException::Numbered(kErrOutOfMemory, "CItems::SortByKey", nullptr);
   }
   switch (w) {
     case 1: SortRowsByKey<1>(data_.data(), scratch.data(), n, w); break;

@@ -2,6 +2,7 @@
 
 #include <new>
 
+#include "base/error_numbers.h"
 #include "base/checked_allocation.h"
 #include "base/exception_family.h"
 
@@ -20,7 +21,7 @@ void CItemsRow::AllocateRow() {
     ReserveChecked(row_, static_cast<std::size_t>(width_));
     row_.assign(static_cast<std::size_t>(width_), 0);
   } catch (const std::bad_alloc&) {
-    throw CFreeItemException::Numbered(11, "CItemsRow::AllocateRow", nullptr);
+    throw CFreeItemException::Numbered(kErrOutOfMemory, "CItemsRow::AllocateRow", nullptr);
   }
   allocated_ = true;
 }

@@ -359,6 +359,7 @@ void MFile::WriteVoid(const void* data, std::size_t n) {
 
 void MFile::WriteLength(std::size_t n, const char* method) {
   if (n > kMaxStringLength) {
+    // Text kept as written: callers match on it. Do not correct.
     throw CMFileException::Text("Fatal error writting len to file", method, nullptr);
   }
   uint8_t b[2];
@@ -387,6 +388,7 @@ void MFile::WriteValue(const CValue& value) {
   };
   auto write_text = [&](std::size_t length, const void* data, std::size_t n) {
     if (length > kMaxStringLength) {
+      // Text kept as written: callers match on it. Do not correct.
       throw CMFileException::Text("Fatal error writting len to file", kMethod, nullptr);
     }
     step("Fatal error writting len to file", [&] { WriteLength(length, kMethod); });
@@ -405,6 +407,7 @@ void MFile::WriteValue(const CValue& value) {
       }
       case VALUE_TYPE::Integer:
         bytes::StoreI32(b, value.GetInteger());
+        // Text kept as written: callers match on it. Do not correct.
         step("Fatal error writting int to file", [&] { mwrite(b, 4); });
         return;
       case VALUE_TYPE::Double:

@@ -16,8 +16,6 @@ namespace qm {
 
 namespace {
 
-// The caller number in the temporary names of option files.
-constexpr int32_t kTempNameCaller = 9;
 constexpr std::string_view kTraceTag = "PILIB.PiStartPoint.OptionFiles";
 
 std::string ConfigFolder(const CGlobalDefs& defs) {
@@ -56,7 +54,7 @@ void WriteString(MFile& file, const std::u16string& text) { file.WriteStr(CWStr(
 void ReplaceOptionFile(const CGlobalDefs& defs, const char* name,
                        const std::function<void(MFile&)>& write) {
   const std::string folder = ConfigFolder(defs);
-  const std::string temporary = folder + SLGetTempFileName(defs, true, kTempNameCaller) + ".tmp";
+  const std::string temporary = folder + SLGetTempFileName(defs, true, kTempCallerOptionFiles) + ".tmp";
   try {
     MFile file;
     file.OpenFile(temporary, MFile::kCreate);

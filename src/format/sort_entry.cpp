@@ -30,6 +30,7 @@ std::size_t ValueBytes(VALUE_TYPE type) {
 }
 
 [[noreturn]] void TextTooLong(const char* method) {
+  // Text kept as written: callers match on it. Do not correct.
   throw CMFileException::Text("Fatal error writting len to file", method, nullptr);
 }
 

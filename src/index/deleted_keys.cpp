@@ -141,7 +141,7 @@ class TempFile {
 class ExclusiveDeletedKeysLock {
  public:
   ExclusiveDeletedKeysLock(const CGlobalDefs& defs, std::string_view findex_name)
-      : lock_(defs.GetGroup(), findex_name, kLockDeletedKeys) {
+      : lock_(defs.GetLockScope(), defs.GetGroup(), findex_name, kLockDeletedKeys) {
     lock_.LockExclusive();
   }
   ~ExclusiveDeletedKeysLock() { lock_.UnlockAll(); }
@@ -197,7 +197,7 @@ std::vector<int32_t> ReadDeletedKeys(const CGlobalDefs& defs, std::string_view f
   return Guard<CPiDeleteException>(kMethod, [&] {
     RequireFileName(findex_name, kMethod);
     const std::string path = DeletedKeysPath(defs, findex_name);
-    CLockManager lock(defs.GetGroup(), findex_name, kLockDeletedKeys);
+    CLockManager lock(defs.GetLockScope(), defs.GetGroup(), findex_name, kLockDeletedKeys);
     lock.LockReader();
     std::optional<std::vector<int32_t>> keys = ReadKeyFile(path, kMethod);
     lock.UnlockReaders();

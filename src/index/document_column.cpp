@@ -4,6 +4,7 @@
 #include <limits>
 #include <system_error>
 
+#include "platform/file_io.h"
 #include "platform/text_encoding.h"
 #include "base/trace.h"
 #include "sources/column_conversion.h"
@@ -54,11 +55,11 @@ std::optional<std::string> FileUnderBase(std::string_view base, std::string_view
   std::string joined(base);
   joined += value;
   if (base.empty()) return joined;
-  std::error_code ec;
-  const fs::path resolved_base = fs::weakly_canonical(fs::path(base), ec).lexically_normal();
-  if (ec) return std::nullopt;
-  const fs::path resolved = fs::weakly_canonical(fs::path(joined), ec).lexically_normal();
-  if (ec) return std::nullopt;
+  const auto base_path = platform::WeaklyCanonicalPath(std::string(base));
+  const auto joined_path = platform::WeaklyCanonicalPath(joined);
+  if (!base_path || !joined_path) return std::nullopt;
+  const fs::path resolved_base(*base_path);
+  const fs::path resolved(*joined_path);
   // Component by component, so /data/docs2 is not taken for a file below /data/docs.
   auto b = resolved_base.begin();
   auto p = resolved.begin();

@@ -2,10 +2,11 @@
 
 #include <algorithm>
 #include <cstring>
-#include <filesystem>
 #include <new>
 #include <system_error>
 
+#include "platform/file_io.h"
+#include "base/error_numbers.h"
 #include "format/sort_stream.h"
 #include "base/checked_allocation.h"
 #include "base/exception_family.h"
@@ -17,9 +18,6 @@ namespace qm {
 
 namespace {
 
-// The caller number in the temporary names of the sort files.
-constexpr int32_t kSortFileCaller = 44;
-constexpr int32_t kAllocationFailed = 11;
 // Room reserved per array entry at first; the arena grows past it for long text.
 constexpr std::size_t kFirstBytesPerEntry = 32;
 
@@ -35,9 +33,9 @@ const char* CEntrySort::TraceTag() const {
 void CEntrySort::RaiseAllocationFailure() {
   FreeRowArrays();
   if (module_ == Module::PiSort) {
-    throw CPiSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+    throw CPiSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
   }
-  throw CPiOrderSortException::Numbered(kAllocationFailed, "AllocateRowArrays", nullptr);
+  throw CPiOrderSortException::Numbered(kErrOutOfMemory, "AllocateRowArrays", nullptr);
 }
 
 void CEntrySort::AllocateRowArrays() {
@@ -58,13 +56,12 @@ void CEntrySort::FreeRowArrays() {
 }
 
 void CEntrySort::OpenSortFile(const CGlobalDefs& defs, MFile& file) {
-  const std::string path = SLGetTempWorkFilePath(defs, kSortFileCaller);
+  const std::string path = SLGetTempWorkFilePath(defs, kTempCallerSortRuns);
   try {
     file.OpenFile(path, MFile::kCreate, platform::kFileAttributeDeleteOnClose);
   } catch (...) {
     // The name was created for us; without an open file nothing else removes it.
-    std::error_code ignored;
-    std::filesystem::remove(path, ignored);
+    platform::UnlinkFile(path);  // best effort: the file may be gone already
     throw;
   }
 }

@@ -349,7 +349,7 @@ std::vector<std::string> CheckFindexPair(const std::string& sdx_path, const std:
 
 std::vector<std::string> CheckFindexFiles(const CGlobalDefs& defs, std::string_view name) {
   std::vector<std::string> problems;
-  CLockManager lock(defs.GetGroup(), findex::OwnerName(name), kLockFindex);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), findex::OwnerName(name), kLockFindex);
   lock.LockReader();
   PairCheck(findex::PathsOf(defs, name), problems).Run();
   for (int32_t n = 1; problems.size() < kMostProblems; ++n) {

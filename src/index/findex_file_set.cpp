@@ -69,12 +69,12 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
   const FilePaths target = PathsOf(defs, name);
   const std::string group = defs.GetGroup();
   // Searches lock the findex they open, and read its add-ons under that lock.
-  CLockManager owner_lock(group, OwnerName(name), kLockFindex);
+  CLockManager owner_lock(defs.GetLockScope(), group, OwnerName(name), kLockFindex);
   file_swap::LockExclusively<CPiFIndexException>(owner_lock, "findex", OwnerName(name),
                                                  kRenameMethod, kErrorTag);
   std::optional<CLockManager> add_on_lock;
   if (IsAddOnName(name)) {
-    add_on_lock.emplace(group, ToUpper(name), kLockFindex);
+    add_on_lock.emplace(defs.GetLockScope(), group, ToUpper(name), kLockFindex);
     file_swap::LockExclusively<CPiFIndexException>(*add_on_lock, "findex", ToUpper(name),
                                                    kRenameMethod, kErrorTag);
   }

@@ -33,7 +33,7 @@ CIndexHeader ReadStoredDefinition(const CGlobalDefs& defs, std::string_view name
 }
 
 CIndexHeader ReadFindexHeaderShared(CGlobalDefs& defs, std::string_view name) {
-  CLockManager lock(defs.GetGroup(), name, kLockFindex);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockFindex);
   lock.LockReader();
   return ReadFindexHeader(defs, name);
 }

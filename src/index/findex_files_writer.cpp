@@ -9,6 +9,7 @@
 #include <optional>
 #include <vector>
 
+#include "base/error_numbers.h"
 #include "format/sort_entry.h"
 #include "format/sort_stream.h"
 #include "platform/file_io.h"
@@ -75,7 +76,7 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
     posting_writer.emplace(columns, limits.max_fst_bytes);
   } catch (const std::bad_alloc&) {
     Trace(true, kErrorTag, "Out of memory 1");
-    throw CPiFIndexException::Numbered(11, kMethod, nullptr);
+    throw CPiFIndexException::Numbered(kErrOutOfMemory, kMethod, nullptr);
   }
   CFindexPostingWriter& postings = *posting_writer;
   BFile sdx;
@@ -175,7 +176,7 @@ FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const st
     return WriteFiles(header, sorted, sdx_path, fst_path, limits, std::move(batch_observer));
   } catch (const std::bad_alloc&) {
     Trace(true, kErrorTag, "Out of memory 2");
-    throw CPiFIndexException::Numbered(11, kMethod, nullptr);
+    throw CPiFIndexException::Numbered(kErrOutOfMemory, kMethod, nullptr);
   }
 }
 

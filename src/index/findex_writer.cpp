@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <optional>
 
+#include "base/error_numbers.h"
 #include "index/findex_file_set.h"
 #include "index/findex_files_writer.h"
 #include "index/word_sort.h"
@@ -21,7 +22,6 @@ namespace {
 
 constexpr const char* kTraceTag = "PILIB.PiFIndex.BuildRowFindex";
 constexpr int32_t kModeRead = 3;
-constexpr int32_t kTempCaller = 5;
 // Names are taken until one is free; the generator's lock makes them unique
 // between builds, so only files left behind by a crash can be in the way.
 constexpr int kTempNameAttempts = 100;
@@ -59,7 +59,7 @@ void CPiFIndex::Open(std::string_view name, int32_t mode) {
     if (mode == kModeBuild) {
       const std::string folder = defs_.GetFullDataPath(FolderKind::Indexes);
       for (int attempt = 1;; ++attempt) {
-        const std::string base = folder + SLGetTempFileName(defs_, true, kTempCaller);
+        const std::string base = folder + SLGetTempFileName(defs_, true, kTempCallerFindexFiles);
         std::optional<TempFileClaim> sdx = TempFileClaim::Create(base + ".tmp1");
         if (!sdx && errno != EEXIST) {
           throw CPiFIndexException::Text(kOpenFailureText, "Open", nullptr, base + ".tmp1");
@@ -195,7 +195,7 @@ void CPiFIndex::DropFindex() {
   Guarded("DropFindex", [&] {
     if (state_->mode == 0) throw CPiFIndexException::General("DropFindex");
     if (findex::IsAddOnName(state_->name))
-      throw CPiFIndexException::Numbered(44, "DropFindex", nullptr);
+      throw CPiFIndexException::Numbered(kErrDropAddOn, "DropFindex", nullptr);
     const std::string name = state_->name;
     Close();
     findex::DropFiles(defs_, name);

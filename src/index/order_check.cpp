@@ -240,7 +240,7 @@ class OrderCheck {
 
 std::vector<std::string> CheckOrderFiles(const CGlobalDefs& defs, std::string_view name) {
   std::vector<std::string> problems;
-  CLockManager lock(defs.GetGroup(), name, kLockOrder);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockOrder);
   lock.LockReader();
   OrderCheck(defs, name, problems).Run();
   return problems;

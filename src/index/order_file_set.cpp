@@ -25,7 +25,6 @@ namespace {
 
 constexpr const char* kRenameMethod = "RenameOrder2";
 constexpr const char* kErrorTag = "PILIB_ERROR.PiOrder.RenameOrder2";
-constexpr int32_t kTempCaller = 6;
 // The generator makes names unique between builds: only files left behind
 // by a crash can be in the way of one.
 constexpr int kTempNameAttempts = 100;
@@ -65,7 +64,7 @@ void CheckNames(const COrderInfo& definition, const char* method) {
 }
 
 COrderInfo ReadInfoShared(const CGlobalDefs& defs, std::string_view name) {
-  CLockManager lock(defs.GetGroup(), name, kLockOrder);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockOrder);
   lock.LockReader();
   BFile file;
   file.OpenFile(PathsOf(defs, name).sri, BFile::kReadOnly, kBlockUnits);
@@ -115,7 +114,7 @@ BuildFiles::BuildFiles(const CGlobalDefs& defs, std::size_t columns) {
   constexpr const char* kMethod = "OpenOrder";
   const std::string folder = OrderFolder(defs);
   for (int attempt = 1;; ++attempt) {
-    const std::string base = folder + SLGetTempFileName(defs, true, kTempCaller);
+    const std::string base = folder + SLGetTempFileName(defs, true, kTempCallerOrderFiles);
     std::vector<std::string> paths{base + ".sri.tmp", base + ".srt.tmp"};
     for (std::size_t i = 0; i < columns; ++i) {
       paths.push_back(base + "_" + std::to_string(i + 1) + ".tmp");
@@ -168,7 +167,7 @@ void BuildFiles::MoveIntoPlace(const CGlobalDefs& defs, std::string_view name,
   moves.emplace_back(srt_, target.srt);
   moves.emplace_back(sri_, target.sri);
 
-  CLockManager lock(defs.GetGroup(), name, kLockOrder);
+  CLockManager lock(defs.GetLockScope(), defs.GetGroup(), name, kLockOrder);
   file_swap::LockExclusively<CPiOrderException>(lock, "order", ToUpper(name), kRenameMethod,
                                                 kErrorTag);
   // Each old file goes aside just before its new one comes in.

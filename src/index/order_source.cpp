@@ -23,20 +23,6 @@ bool IsBinary(int16_t sql_type) {
   return sql_type == SQL_BINARY || sql_type == SQL_VARBINARY || sql_type == SQL_LONGVARBINARY;
 }
 
-RowSelection SelectionOf(const COrderInfo& definition) {
-  RowSelection s;
-  s.Table = definition.TableName;
-  s.SqlUsedAsTable = definition.SqlUsedAsTable;
-  s.SqlSelect = definition.SqlSelect;
-  s.KeyColumn = definition.KeyColumn;
-  for (const OrderColumn& column : definition.Columns) s.Columns.push_back(column.Name);
-  s.SortMax = definition.SortMax;
-  s.UpdateFlags = definition.UpdateFlags;
-  s.DateTimeKeyColumn = definition.DateTimeKeyColumn;
-  s.MaxDateTimeKey = definition.MaxDateTimeKey;
-  return s;
-}
-
 }  // namespace
 
 struct OrderSource::Plan {
@@ -63,7 +49,7 @@ OrderSource::OrderSource(CGlobalDefs& defs, const COrderInfo& definition, const 
   database_ = std::make_unique<CShareDatabase>(source_);
   database_->Connect();
 
-  const RowSelection selection = SelectionOf(definition);
+  const RowSelection selection = RowSelection::FromHeader(definition);
   start_time_ = SystemTimeToSQLTime(platform::CurrentLocalTime());
   selection.Execute(*database_, defs_.TraceLevel1(), "PILIB.PiOrderSort.SortRawData");
 
@@ -135,6 +121,7 @@ int64_t OrderSource::ReadRows(const RowVisitor& visit, const char* trace_tag, co
       db.CacheColumns();
     } catch (const CShareDatabaseWarning& warning) {
       Trace(true, trace_tag,
+            // Text kept as written: callers match on it. Do not correct.
             "Fetching database rows interupted because of database warning (probably a harmless "
             "no rows available): %S",
             warning.GetCurrentEntry().text);

@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "base/error_numbers.h"
 #include "index/entry_sort.h"
 #include "format/order_column_file.h"
 #include "index/order_file_set.h"
@@ -34,7 +35,6 @@ namespace {
 constexpr const char* kValuesTag = "PILIB.PiOrder.BuildOrderInt";
 constexpr const char* kRanksTag = "PILIB.PiOrderSort.SortRawData";
 constexpr const char* kRanksMethod = "BuildOrderAll";
-constexpr int32_t kNoRowsSelected = 26;
 constexpr int32_t kIgnoreCaseFlag = 1;
 constexpr int32_t kSaveConnectionFlag = 2;
 
@@ -138,7 +138,7 @@ void CPiOrder::OpenOrder(std::string_view name, int32_t mode, std::size_t column
     } else if (mode == kModeRead) {
       const order_files::OrderPaths paths = order_files::PathsOf(defs_, name);
       // Held while the files are opened: they are the files of one build.
-      CLockManager lock(defs_.GetGroup(), name, kLockOrder);
+      CLockManager lock(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
       lock.LockReader();
       try {
         state_->sri.OpenFile(paths.sri, BFile::kReadOnly, order_files::kBlockUnits);
@@ -300,7 +300,7 @@ bool CPiOrder::BuildValues(Build& build, CItems& out, const char* method) {
       kValuesTag, method);
   defs_.SetProgress(15);
   if (count == 0) {
-    if (build.rebuild) throw CPiOrderSortException::Numbered(kNoRowsSelected, method, nullptr);
+    if (build.rebuild) throw CPiOrderSortException::Numbered(kErrOrderNoRows, method, nullptr);
     return false;
   }
 
@@ -388,7 +388,7 @@ bool CPiOrder::BuildRanks(Build& build, CItems& out) {
   defs_.SetProgress(15);
   if (count == 0) {
     if (build.rebuild)
-      throw CPiOrderSortException::Numbered(kNoRowsSelected, kRanksMethod, nullptr);
+      throw CPiOrderSortException::Numbered(kErrOrderNoRows, kRanksMethod, nullptr);
     return false;
   }
 
@@ -466,7 +466,7 @@ void CPiOrder::DropOrder() {
     const std::string name = state_->name;
     const COrderInfo info = state_->info;
     CloseOrder();
-    CLockManager lock(defs_.GetGroup(), name, kLockOrder);
+    CLockManager lock(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
     lock.LockExclusive();
     order_files::DropFiles(defs_, name, info);
   });
@@ -477,7 +477,7 @@ std::vector<std::string> CPiOrder::DropOrderFiles(std::string_view name) {
   return GuardOrder(kMethod, [&] {
     RequirePlainName<CPiOrderException>("order", name, kMethod);
     CloseOrder();
-    CLockManager lock(defs_.GetGroup(), name, kLockOrder);
+    CLockManager lock(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
     lock.LockExclusive();
     std::vector<std::string> removed = order_files::ExistingFiles(defs_, name);
     if (removed.empty()) {

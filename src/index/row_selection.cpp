@@ -5,6 +5,7 @@
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
 #include "format/index_header.h"
+#include "format/order_info.h"
 #include "base/sql_time.h"
 #include "base/trace.h"
 #include "sources/share_database.h"
@@ -17,19 +18,36 @@ bool SameColumn(const std::string& a, const std::string& b) { return ToUpper(a) 
 
 }  // namespace
 
-RowSelection RowSelection::FromHeader(const CIndexHeader& header) {
+namespace {
+
+// The fields findex headers and order infos share.
+template <class Definition>
+RowSelection CommonSelection(const Definition& definition) {
   RowSelection s;
-  s.Table = header.TableName;
-  s.SqlUsedAsTable = header.SqlUsedAsTable;
-  s.SqlSelect = header.SqlSelect;
-  s.KeyColumn = header.KeyColumn;
+  s.Table = definition.TableName;
+  s.SqlUsedAsTable = definition.SqlUsedAsTable;
+  s.SqlSelect = definition.SqlSelect;
+  s.KeyColumn = definition.KeyColumn;
+  s.SortMax = definition.SortMax;
+  s.UpdateFlags = definition.UpdateFlags;
+  s.DateTimeKeyColumn = definition.DateTimeKeyColumn;
+  s.MaxDateTimeKey = definition.MaxDateTimeKey;
+  return s;
+}
+
+}  // namespace
+
+RowSelection RowSelection::FromHeader(const CIndexHeader& header) {
+  RowSelection s = CommonSelection(header);
   for (const auto& [name, tags] : header.Columns) s.Columns.push_back(name);
-  s.SortMax = header.SortMax;
   s.IndexMaxSize = header.IndexMaxSize;
   s.IndexStartValue = header.IndexStartValue;
-  s.UpdateFlags = header.UpdateFlags;
-  s.DateTimeKeyColumn = header.DateTimeKeyColumn;
-  s.MaxDateTimeKey = header.MaxDateTimeKey;
+  return s;
+}
+
+RowSelection RowSelection::FromHeader(const COrderInfo& info) {
+  RowSelection s = CommonSelection(info);
+  for (const OrderColumn& column : info.Columns) s.Columns.push_back(column.Name);
   return s;
 }
 

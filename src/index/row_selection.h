@@ -15,6 +15,7 @@ namespace qm {
 
 class CShareDatabase;
 struct CIndexHeader;
+struct COrderInfo;
 
 struct RowSelection {
   // Update flags: bit 1 use the date/time key, bit 2 with its fraction.
@@ -35,8 +36,10 @@ struct RowSelection {
   std::string DateTimeKeyColumn;
   DateTimeValue MaxDateTimeKey;
 
-  // The findex's fields; the columns in the column map's order.
+  // The definition's fields; a findex's columns in its column map's order, an
+  // order's in its column order. Orders have no size limits.
   static RowSelection FromHeader(const CIndexHeader& header);
+  static RowSelection FromHeader(const COrderInfo& info);
 
   // The date/time update key is in use: flagged and named.
   bool UsesDateTimeKey() const {

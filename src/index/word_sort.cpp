@@ -9,6 +9,7 @@
 #include <optional>
 #include <vector>
 
+#include "base/error_numbers.h"
 #include "index/document_column.h"
 #include "index/entry_sort.h"
 #include "format/findex_type.h"
@@ -31,7 +32,6 @@ namespace {
 constexpr const char* kSortTag = "PILIB.PiSort.SortFindexTable";
 constexpr const char* kRowsTag = "PILIB.PiSort.WriteFindexRows";
 constexpr const char* kRowsMethod = "WriteFindexRows";
-constexpr int32_t kNoRowsSelected = 47;
 constexpr int64_t kRowTraceStep = 100000;
 
 bool IsText(VALUE_TYPE t) { return t == VALUE_TYPE::AsciiString || t == VALUE_TYPE::UnicodeString; }
@@ -178,6 +178,7 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, MFile& raw, CIndexHea
       database.CacheColumns();
     } catch (const CShareDatabaseWarning& warning) {
       Trace(true, kRowsTag,
+            // Text kept as written: callers match on it. Do not correct.
             "Fetching database rows interupted because of database warning (probably a harmless "
             "no rows available): %S",
             warning.GetCurrentEntry().text);
@@ -264,7 +265,7 @@ int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows
     }
     if (rows == 0) {
       if (no_rows == NoRows::Allow) return rows;
-      throw CPiSortException::Numbered(kNoRowsSelected, "SortFindexTable", nullptr);
+      throw CPiSortException::Numbered(kErrFindexNoRows, "SortFindexTable", nullptr);
     }
     defs_.SetProgress(15);
 

@@ -34,11 +34,12 @@ std::string KindLockName(std::string_view group, std::string_view object_name, i
 
 }  // namespace
 
-CLockManager::CLockManager(std::string_view group, std::string_view object_name, int32_t kind,
-                           int32_t caller_flag)
-    : lock_name_(KindLockName(group, object_name, kind)), caller_flag_(caller_flag) {}
+CLockManager::CLockManager(std::string_view scope, std::string_view group,
+                           std::string_view object_name, int32_t kind, int32_t caller_flag)
+    : scope_(scope), lock_name_(KindLockName(group, object_name, kind)), caller_flag_(caller_flag) {}
 
-CLockManager::CLockManager(std::string_view whole_name) : lock_name_(whole_name) {}
+CLockManager::CLockManager(std::string_view scope, std::string_view whole_name)
+    : scope_(scope), lock_name_(whole_name) {}
 
 CLockManager::~CLockManager() { UnlockAll(); }
 
@@ -75,7 +76,7 @@ void CLockManager::CreateWriterMutex() {
   // The writer has a description of its own, so releasing the readers (which
   // closes theirs) never drops the writer.
   int error = 0;
-  writer_lock_ = NamedLock::Open(lock_name_, error);
+  writer_lock_ = NamedLock::Open(scope_, lock_name_, error);
   if (!writer_lock_) {
     throw CLockManagerException::Text("Error creating mutex: %S", "CreateWriterMutex", nullptr,
                                       lock_name_);
@@ -84,7 +85,7 @@ void CLockManager::CreateWriterMutex() {
 
 void CLockManager::CreateReaderSemaphore() {
   int error = 0;
-  readers_ = NamedLock::Open(lock_name_, error);
+  readers_ = NamedLock::Open(scope_, lock_name_, error);
   if (!readers_) {
     throw CLockManagerException::Text("Error creating semaphore: %S, Error Code: %i",
                                       "CreateReaderSemaphore", nullptr, lock_name_, error);

@@ -22,13 +22,16 @@ namespace platform {
 class NamedLock;
 }
 
+// Every lock lives in a scope: the data directory (or home) whose files it
+// guards. Processes share a lock only when they name the same lock in the same
+// directory, so builds in unrelated data directories never wait for each other.
 class CLockManager {
  public:
   // "MORVIL_" + kind + "_" + group + "_" + object name, upper-cased.
-  CLockManager(std::string_view group, std::string_view object_name, int32_t kind,
-               int32_t caller_flag = 0);
+  CLockManager(std::string_view scope, std::string_view group, std::string_view object_name,
+               int32_t kind, int32_t caller_flag = 0);
   // The lock name is exactly whole_name (per-command locks).
-  explicit CLockManager(std::string_view whole_name);
+  CLockManager(std::string_view scope, std::string_view whole_name);
   ~CLockManager();
   CLockManager(const CLockManager&) = delete;
   CLockManager& operator=(const CLockManager&) = delete;
@@ -59,6 +62,7 @@ class CLockManager {
   void CreateWriterMutex();
   void CreateReaderSemaphore();
 
+  std::string scope_;
   std::string lock_name_;
   std::unique_ptr<platform::NamedLock> readers_;
   int32_t reader_count_ = 0;

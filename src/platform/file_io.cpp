@@ -7,6 +7,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <filesystem>
 #include <algorithm>
 #include <system_error>
@@ -79,6 +80,21 @@ int64_t FileSize(int fd) {
 bool FileExists(const std::string& path) {
   struct stat st {};
   return ::stat(path.c_str(), &st) == 0;
+}
+
+std::string CanonicalPath(const std::string& path) {
+  char* resolved = ::realpath(path.c_str(), nullptr);
+  if (resolved == nullptr) return {};
+  std::string out(resolved);
+  std::free(resolved);
+  return out;
+}
+
+std::optional<std::string> WeaklyCanonicalPath(const std::string& path) {
+  std::error_code ec;
+  std::filesystem::path resolved = std::filesystem::weakly_canonical(path, ec);
+  if (ec) return std::nullopt;
+  return resolved.lexically_normal().string();
 }
 
 FileHandle OpenFileAs(const std::string& path, FileAccess access, FileDisposition disposition,

@@ -5,6 +5,7 @@
 #include <sys/types.h>
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -52,6 +53,12 @@ ssize_t ReadSome(int fd, void* data, std::size_t n);
 int64_t FileSize(int fd);
 
 bool FileExists(const std::string& path);
+// The canonical form of path (symbolic links resolved); empty when it does
+// not exist.
+std::string CanonicalPath(const std::string& path);
+// The path with the symbolic links of its existing part resolved and "." and
+// ".." folded; nullopt when the file system cannot tell.
+std::optional<std::string> WeaklyCanonicalPath(const std::string& path);
 
 // --- opening with the engine's dispositions ---
 

@@ -68,6 +68,23 @@ std::string NamedLock::LockFolder() {
   return folder;
 }
 
+std::string NamedLock::LockFolder(std::string_view scope) {
+  std::string folder = LockFolder();
+  if (scope.empty()) return folder;
+  std::string path = CanonicalPath(std::string(scope));
+  if (path.empty()) {
+    // Not there (yet): the path as written, without trailing slashes.
+    path = scope;
+    while (path.size() > 1 && path.back() == '/') path.pop_back();
+  }
+  static constexpr char kHex[] = "0123456789abcdef";
+  const uint64_t h = Fnv1a64(path);
+  folder += "dir-";
+  for (int shift = 60; shift >= 0; shift -= 4) folder += kHex[(h >> shift) & 0x0F];
+  folder += '/';
+  return folder;
+}
+
 std::string NamedLock::LockFileName(std::string_view name) {
   // "%" is always followed by two hex digits in an escaped name, so "%%" marks
   // the forms below as ones no plain escaping can produce.
@@ -96,8 +113,10 @@ std::string NamedLock::LockFileName(std::string_view name) {
   return hashed;
 }
 
-std::unique_ptr<NamedLock> NamedLock::Open(std::string_view name, int& error) {
-  const std::string folder = LockFolder();
+std::unique_ptr<NamedLock> NamedLock::Open(std::string_view scope, std::string_view name,
+                                           int& error) {
+  const std::string root = LockFolder();
+  const std::string folder = LockFolder(scope);
   const std::string path = folder + LockFileName(name);
   // Lock files are never removed (a removed file would let two holders lock
   // different files of one name), so the loop ends within a few rounds unless
@@ -131,7 +150,9 @@ std::unique_ptr<NamedLock> NamedLock::Open(std::string_view name, int& error) {
         return nullptr;
       }
     } else if (errno == ENOENT) {
-      const int folder_error = EnsureFolder(folder);
+      // The root first, so that it too is open to every account.
+      int folder_error = EnsureFolder(root);
+      if (folder_error == 0 && folder != root) folder_error = EnsureFolder(folder);
       if (folder_error != 0) {
         error = folder_error;
         return nullptr;

@@ -24,12 +24,19 @@ class NamedLock {
 
   enum class WaitResult { kTaken, kTimedOut, kFailed };
 
-  // Opens the lock file of name, creating it (mode 0666) and the lock folder
-  // when missing. Returns nullptr with error set to the errno on failure.
-  static std::unique_ptr<NamedLock> Open(std::string_view name, int& error);
+  // Opens the lock file of name in the lock folder of scope, creating it (mode
+  // 0666) and the folders when missing. Returns nullptr with error set to the
+  // errno on failure.
+  static std::unique_ptr<NamedLock> Open(std::string_view scope, std::string_view name,
+                                         int& error);
 
-  // Lock folder: $MORVIL_LOCKDIR, else /dev/shm/morvil-locks/; ends in "/".
+  // Root lock folder: $MORVIL_LOCKDIR, else /dev/shm/morvil-locks/; ends in "/".
   static std::string LockFolder();
+  // The lock folder of a scope (a data directory or home path): a subfolder of
+  // the root named by a hash of the canonical path (symlinks resolved), so that
+  // every path naming one directory shares its locks and unrelated
+  // directories never do. An empty scope is the root itself.
+  static std::string LockFolder(std::string_view scope);
   // The file name of a name's lock file: bytes that cannot stand in a file name
   // are escaped as "%XX", so distinct names never share a file.
   static std::string LockFileName(std::string_view name);

@@ -1,6 +1,5 @@
 #include "sources/doc_converter.h"
 
-#include <filesystem>
 #include <system_error>
 
 #include "platform/file_io.h"
@@ -15,8 +14,6 @@ namespace qm {
 
 namespace {
 
-// The caller number in temporary names made for converter output.
-constexpr int32_t kTempCaller = 83;
 
 // Runs one step of a conversion: exceptions of the family pass on unchanged,
 // anything else becomes the step's own message.
@@ -79,8 +76,7 @@ class OutputFile {
   OutputFile& operator=(const OutputFile&) = delete;
   ~OutputFile() {
     if (!path_.empty()) {
-      std::error_code ignored;
-      std::filesystem::remove(path_, ignored);
+      platform::UnlinkFile(path_);  // best effort: the file may be gone already
     }
   }
   const std::string& Path() const { return path_; }
@@ -145,7 +141,7 @@ void DocConverter::RunProgram(const std::string& command_line, const std::string
                               FieldMap& fields) {
   // The output file is made only for a program that writes one, so other
   // conversions leave nothing behind in the work folder.
-  OutputFile output(SLGetTempWorkFilePath(defs_, kTempCaller));
+  OutputFile output(SLGetTempWorkFilePath(defs_, kTempCallerConverterOutput));
   // The line is split before anything is put in; each argument then gets its
   // folder placeholders and the two paths.
   const ArgumentFiller fill = [&](std::string_view argument) {

@@ -1,8 +1,8 @@
 #include "sources/document_text.h"
 
-#include <filesystem>
 #include <system_error>
 
+#include "platform/file_io.h"
 #include "base/exception_family.h"
 #include "config/file_operations.h"
 #include "config/global_defs.h"
@@ -15,8 +15,6 @@ namespace qm {
 
 namespace {
 
-// The caller number in temporary names of fetched and embedded documents.
-constexpr int32_t kTempCaller = 84;
 
 std::string Explain(CExceptionBase& e) {
   std::string text = e.GetFullTextUtf8(kLevelWritten);
@@ -30,8 +28,7 @@ class WorkFile {
   WorkFile(const WorkFile&) = delete;
   WorkFile& operator=(const WorkFile&) = delete;
   ~WorkFile() {
-    std::error_code ignored;
-    std::filesystem::remove(path_, ignored);
+    platform::UnlinkFile(path_);  // best effort: the file may be gone already
   }
   const std::string& Path() const { return path_; }
 
@@ -61,7 +58,7 @@ std::string UrlDocumentText(DocConverter& converter, Connection& connection,
                             const CGlobalDefs& defs, std::string_view base_url,
                             std::string_view value) {
   const std::string address = std::string(base_url) + std::string(value);
-  const WorkFile file(SLGetTempWorkFilePath(defs, kTempCaller, address));
+  const WorkFile file(SLGetTempWorkFilePath(defs, kTempCallerDocument, address));
   try {
     connection.OpenConnection(address);
     connection.DownloadResource(file.Path());
@@ -77,7 +74,7 @@ std::string UrlDocumentText(DocConverter& converter, Connection& connection,
 
 std::string EmbeddedDocumentText(DocConverter& converter, const CGlobalDefs& defs,
                                  std::string_view content, std::string_view document_type) {
-  const WorkFile file(SLGetTempWorkFilePath(defs, kTempCaller));
+  const WorkFile file(SLGetTempWorkFilePath(defs, kTempCallerDocument));
   try {
     WriteTextFile(file.Path(), content);
   } catch (CExceptionBase& e) {

@@ -7,10 +7,11 @@
 #include <algorithm>
 #include <bit>
 #include <cstring>
-#include <filesystem>
 #include <limits>
 #include <new>
 
+#include "platform/file_io.h"
+#include "base/error_numbers.h"
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
 #include "config/file_operations.h"
@@ -37,9 +38,8 @@ constexpr std::size_t kFirstNumberPieceBytes = 64;
 // stops there, the rest would be cut anyway.
 constexpr std::size_t kEnoughTextBytes = kMaxColumnCharacters * 4 + 8;
 constexpr std::size_t kBinaryPieceBytes = 2000;
-// The caller number in the names of binary column copies.
-constexpr int32_t kBinaryCopyCaller = 81;
 constexpr int kMaxTypindexTries = 100;
+// The index name prefix "typindex" is kept as written: existing indexes carry it.
 constexpr std::string_view kTypindex = "typindex";
 
 SQLHSTMT Stmt(const OdbcHandle& h) { return static_cast<SQLHSTMT>(h.Get()); }
@@ -149,8 +149,7 @@ CShareDatabase::~CShareDatabase() {
     // Nothing can be reported from here; the handles are released regardless.
   }
   for (const auto& path : cache_files_) {
-    std::error_code ec;
-    std::filesystem::remove(path, ec);
+    platform::UnlinkFile(path);  // best effort: the file may be gone already
   }
 }
 
@@ -224,6 +223,7 @@ void CShareDatabase::Connect() {
     if (!statement.Allocate(OdbcHandle::kStatement, &connection)) {
       TakeDiagnostic(connection);
       SQLDisconnect(Dbc(connection));
+      // "SQLAllocStmtv" (the method) is kept as written: callers match on it. Do not correct.
       throw CShareDatabaseException::Text("%S", "SQLAllocStmtv", nullptr, last_diagnostic_);
     }
     environment_ = std::move(environment);
@@ -354,6 +354,50 @@ void CShareDatabase::ExecuteSql(std::string_view statement, int16_t& column_coun
   });
 }
 
+// What the engine makes of each SQL type: the value type it stores, how a
+// value is read, and whether the driver's size means nothing (long and
+// unknown columns get the engine's own size). Anything else is narrow text.
+struct CShareDatabase::SqlTypeTraits {
+  int16_t sql_type;
+  VALUE_TYPE value_type;
+  ReadKind read_kind;
+  bool long_column;
+};
+
+const CShareDatabase::SqlTypeTraits& CShareDatabase::TraitsOf(int16_t sql_type) {
+  using V = VALUE_TYPE;
+  using R = ReadKind;
+  static constexpr SqlTypeTraits kTable[] = {
+      {SQL_INTEGER, V::Integer, R::Integer, false},
+      {SQL_SMALLINT, V::Integer, R::Integer, false},
+      {SQL_TINYINT, V::Integer, R::Integer, false},
+      {SQL_NUMERIC, V::Double, R::Double, false},
+      {SQL_DECIMAL, V::Double, R::Double, false},
+      {SQL_FLOAT, V::Double, R::Double, false},
+      {SQL_REAL, V::Double, R::Double, false},
+      {SQL_DOUBLE, V::Double, R::Double, false},
+      {SQL_DATE, V::DateTime, R::Timestamp, false},
+      {SQL_TIMESTAMP, V::DateTime, R::Timestamp, false},
+      {SQL_TYPE_DATE, V::DateTime, R::Timestamp, false},
+      {SQL_TYPE_TIMESTAMP, V::DateTime, R::Timestamp, false},
+      {SQL_TIME, V::DateTime, R::Time, false},
+      {SQL_TYPE_TIME, V::DateTime, R::Time, false},
+      {SQL_UNKNOWN_TYPE, V::UnicodeString, R::WideText, true},
+      {SQL_WLONGVARCHAR, V::UnicodeString, R::WideText, true},
+      {SQL_WVARCHAR, V::UnicodeString, R::WideText, false},
+      {SQL_WCHAR, V::UnicodeString, R::WideText, false},
+      {SQL_LONGVARCHAR, V::AsciiString, R::NarrowText, true},
+      {SQL_BINARY, V::AsciiString, R::Binary, false},
+      {SQL_VARBINARY, V::AsciiString, R::Binary, true},
+      {SQL_LONGVARBINARY, V::AsciiString, R::Binary, true},
+  };
+  static constexpr SqlTypeTraits kNarrowText{0, V::AsciiString, R::NarrowText, false};
+  for (const SqlTypeTraits& t : kTable) {
+    if (t.sql_type == sql_type) return t;
+  }
+  return kNarrowText;
+}
+
 void CShareDatabase::DescribeColumns(int16_t count) {
   columns_.resize(static_cast<std::size_t>(count));
   for (int16_t i = 1; i <= count; ++i) {
@@ -390,59 +434,16 @@ void CShareDatabase::DescribeColumns(int16_t count) {
     c.description.sql_type = type;
     c.description.decimal_digits = digits;
     c.description.nullable = nullable;
-    switch (type) {
-      case SQL_UNKNOWN_TYPE:
-      case SQL_WLONGVARCHAR:
-      case SQL_LONGVARCHAR:
-      case SQL_VARBINARY:
-      case SQL_LONGVARBINARY:
-        c.description.size = kLongColumnSize;
-        break;
-      default:
-        c.description.size =
-            static_cast<uint32_t>(std::min<SQLULEN>(size, std::numeric_limits<uint32_t>::max()));
-    }
-    c.value_type = ValueTypeOf(type);
-    c.piece_bytes = kFirstTextPieceBytes;
-    switch (type) {
-      case SQL_INTEGER:
-      case SQL_SMALLINT:
-      case SQL_TINYINT:
-        c.read_kind = ReadKind::Integer;
-        c.piece_bytes = kFirstNumberPieceBytes;
-        break;
-      case SQL_NUMERIC:
-      case SQL_DECIMAL:
-      case SQL_FLOAT:
-      case SQL_REAL:
-      case SQL_DOUBLE:
-        c.read_kind = ReadKind::Double;
-        c.piece_bytes = kFirstNumberPieceBytes;
-        break;
-      case SQL_DATE:
-      case SQL_TIMESTAMP:
-      case SQL_TYPE_DATE:
-      case SQL_TYPE_TIMESTAMP:
-        c.read_kind = ReadKind::Timestamp;
-        break;
-      case SQL_TIME:
-      case SQL_TYPE_TIME:
-        c.read_kind = ReadKind::Time;
-        break;
-      case SQL_UNKNOWN_TYPE:
-      case SQL_WLONGVARCHAR:
-      case SQL_WVARCHAR:
-      case SQL_WCHAR:
-        c.read_kind = ReadKind::WideText;
-        break;
-      case SQL_BINARY:
-      case SQL_VARBINARY:
-      case SQL_LONGVARBINARY:
-        c.read_kind = ReadKind::Binary;
-        break;
-      default:
-        c.read_kind = ReadKind::NarrowText;
-    }
+    const SqlTypeTraits& traits = TraitsOf(type);
+    c.description.size =
+        traits.long_column
+            ? kLongColumnSize
+            : static_cast<uint32_t>(std::min<SQLULEN>(size, std::numeric_limits<uint32_t>::max()));
+    c.value_type = traits.value_type;
+    c.read_kind = traits.read_kind;
+    c.piece_bytes = traits.read_kind == ReadKind::Integer || traits.read_kind == ReadKind::Double
+                        ? kFirstNumberPieceBytes
+                        : kFirstTextPieceBytes;
   }
 }
 
@@ -470,34 +471,7 @@ int CShareDatabase::MoveNext() {
 
 // ---------------------------------------------------------------- columns
 
-VALUE_TYPE CShareDatabase::ValueTypeOf(int16_t sql_type) {
-  switch (sql_type) {
-    case SQL_INTEGER:
-    case SQL_SMALLINT:
-    case SQL_TINYINT:
-      return VALUE_TYPE::Integer;
-    case SQL_NUMERIC:
-    case SQL_DECIMAL:
-    case SQL_FLOAT:
-    case SQL_REAL:
-    case SQL_DOUBLE:
-      return VALUE_TYPE::Double;
-    case SQL_DATE:
-    case SQL_TIME:
-    case SQL_TIMESTAMP:
-    case SQL_TYPE_DATE:
-    case SQL_TYPE_TIME:
-    case SQL_TYPE_TIMESTAMP:
-      return VALUE_TYPE::DateTime;
-    case SQL_UNKNOWN_TYPE:
-    case SQL_WLONGVARCHAR:
-    case SQL_WVARCHAR:
-    case SQL_WCHAR:
-      return VALUE_TYPE::UnicodeString;
-    default:
-      return VALUE_TYPE::AsciiString;
-  }
-}
+VALUE_TYPE CShareDatabase::ValueTypeOf(int16_t sql_type) { return TraitsOf(sql_type).value_type; }
 
 void CShareDatabase::CheckIndex(int index, const char* method) const {
   if (index < 1 || index > column_count_) {
@@ -584,8 +558,7 @@ bool CShareDatabase::ReadBinaryToFile(int index, CValue& value) {
     bool armed = true;
     ~Discard() {
       if (armed && !path->empty()) {
-        std::error_code ec;
-        std::filesystem::remove(*path, ec);
+        platform::UnlinkFile(*path);  // best effort: the file may be gone already
       }
     }
   } discard{&path};
@@ -604,7 +577,7 @@ bool CShareDatabase::ReadBinaryToFile(int index, CValue& value) {
     if (!SQL_SUCCEEDED(rc)) RaiseRead("GetColumnValue");
     if (indicator == SQL_NULL_DATA) return false;
     if (first) {
-      path = SLGetTempWorkFilePath(defs_, kBinaryCopyCaller);
+      path = SLGetTempWorkFilePath(defs_, kTempCallerBinaryColumn);
       file.OpenFile(path, MFile::kCreate);
     }
     const bool more = rc == SQL_SUCCESS_WITH_INFO && ReadSqlState(statement_) == "01004";
@@ -701,6 +674,7 @@ int CShareDatabase::ReadColumn(int index, CValue& value, bool reserve) {
         value.SetType(VALUE_TYPE::UnicodeString);
         return kValueRead;
       } catch (const std::bad_alloc&) {
+        // Text kept as written: callers match on it. Do not correct.
         throw CShareDatabaseException::Text("Eror allocating memory", "GetColumnValue", nullptr);
       }
     case ReadKind::Binary:
@@ -831,7 +805,7 @@ void CShareDatabase::CreateIndex(std::string_view statement) {
     auto refused = [this] {
       const CShareDatabaseException cause =
           CShareDatabaseException::Text("%S", "CreateIndex", nullptr, last_diagnostic_);
-      return CShareDatabaseException::Numbered(36, "CreateIndex", &cause);
+      return CShareDatabaseException::Numbered(kErrCreateIndexRefused, "CreateIndex", &cause);
     };
 
     const std::string rest = RestAfterIndexName(statement);

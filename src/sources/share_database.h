@@ -115,6 +115,8 @@ class CShareDatabase {
  private:
   // How a column's value is fetched, decided once when columns are described.
   enum class ReadKind { Integer, Double, Timestamp, Time, NarrowText, WideText, Binary };
+  struct SqlTypeTraits;
+  static const SqlTypeTraits& TraitsOf(int16_t sql_type);
 
   struct Column {
     ColumnDescription description;

@@ -1,6 +1,5 @@
 #include <gtest/gtest.h>
 
-
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -129,6 +128,15 @@ TEST(ExceptionChain, InnerEntriesFollowTheNewOne) {
   EXPECT_EQ(outer.GetFullTextUtf8(100),
             "Write failed (Module:PiFIndex,Method:BuildRowFindex)\r\n"
             "Error opening file: x.fst (Module:WinFile,Method:Open)\r\n");
+  // A handler that knows only std::exception still sees the whole chain.
+  try {
+    throw outer;
+  } catch (const std::exception& e) {
+    EXPECT_STREQ(e.what(),
+                 "Write failed (Module:PiFIndex,Method:BuildRowFindex) <- "
+                 "General Error (Module:Block,Method:InsertRow) <- "
+                 "Error opening file: x.fst (Module:WinFile,Method:Open)");
+  }
 }
 
 TEST(Guard, OwnExceptionsPassAndOthersAreWrapped) {

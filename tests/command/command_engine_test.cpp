@@ -31,7 +31,7 @@ TEST_F(CommandEngineTest, BackgroundJobIsVisibleBeforeExecuteReturnsAndReportsOn
   EXPECT_EQ(Progress(), 100) << "no job yet";
 
   // Hold the findex's CREATE lock so the job waits where the test can see it.
-  CLockManager create_lock(CommandLockName(kCmdFindexStored, "BOOKS"));
+  CLockManager create_lock(home_.Data(), CommandLockName(kCmdFindexStored, "BOOKS"));
   create_lock.LockWriter();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX Books"), 0), S_OK);
   EXPECT_EQ(Progress(), 0);
@@ -54,8 +54,8 @@ TEST_F(CommandEngineTest, BackgroundJobIsVisibleBeforeExecuteReturnsAndReportsOn
 }
 
 TEST_F(CommandEngineTest, AnEndingJobLeavesTheProgressOfALaterOne) {
-  CLockManager first(CommandLockName(kCmdFindexStored, "FIRST"));
-  CLockManager second(CommandLockName(kCmdFindexStored, "SECOND"));
+  CLockManager first(home_.Data(), CommandLockName(kCmdFindexStored, "FIRST"));
+  CLockManager second(home_.Data(), CommandLockName(kCmdFindexStored, "SECOND"));
   first.LockWriter();
   second.LockWriter();
   ASSERT_EQ(command_->Execute(T("UPDATE FINDEX First")), S_OK);

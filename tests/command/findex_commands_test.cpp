@@ -109,11 +109,11 @@ TEST_F(FindexCommandsTest, UpdateCannotAddScoreOrPhrasesTheFindexWasBuiltWithout
 TEST_F(FindexCommandsTest, DropWaitsForBuildsAndSearchesOfTheFindex) {
   WriteFindex("BOOKS", Books(1, 1));
   // A build of the findex holds its CREATE lock.
-  CLockManager build(CommandLockName(kCmdFindexDefined, "BOOKS"));
+  CLockManager build(home_.Data(), CommandLockName(kCmdFindexDefined, "BOOKS"));
   build.LockWriter();
   ASSERT_EQ(command_->ExecuteEx(T("DROP FINDEX Books"), 0), S_OK);
   // A search of the findex holds a reader unit.
-  CLockManager search("PUBLIC", "Books", kLockFindex);
+  CLockManager search(home_.Data(), "PUBLIC", "Books", kLockFindex);
   search.LockReader();
   build.UnlockWriter();
   // The drop cannot finish while the search reads.

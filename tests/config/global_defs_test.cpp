@@ -94,8 +94,6 @@ TEST_F(GlobalDefsTest, PlaceholdersExpandAndTheDataRootCollapsesKeepingCase) {
 TEST_F(GlobalDefsTest, DsnConnectionIsTracedWithoutItsPassword) {
   test::WriteFile(home_.Home() + "Log/traceStat.log", "Trace Level 1\n");
   CGlobalDefs defs;
-  std::filesystem::remove(home_.Home() + "Log/traceStat.log");
-  InitTraceLevels();  // the process-wide flags back to off for the other tests
   EXPECT_TRUE(defs.TraceLevel1());
   EXPECT_FALSE(defs.IsConnectionSet());
   defs.SetConnectionDsn("Books", "reader", "s3cret");
@@ -104,6 +102,8 @@ TEST_F(GlobalDefsTest, DsnConnectionIsTracedWithoutItsPassword) {
   const std::string log = test::TraceOf(home_, "PILIB");
   EXPECT_TRUE(log.ends_with(" (SHARELIB)CGlobalDefs.set_connection - Connection set: DSN; Books\r\n"));
   EXPECT_EQ(log.find("s3cret"), std::string::npos);
+  std::filesystem::remove(home_.Home() + "Log/traceStat.log");
+  InitTraceLevels();  // the process-wide flags back to off for the other tests
 }
 
 TEST_F(GlobalDefsTest, GroupConnectionComesFromAScrambledDbcDat) {

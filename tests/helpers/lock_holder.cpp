@@ -21,7 +21,7 @@ int main(int argc, char** argv) {
   }
   qm::CLockManager::ScaleTimeoutsForTesting(std::atof(argv[1]));
   const std::string mode = argv[2];
-  qm::CLockManager lock(argv[3]);
+  qm::CLockManager lock("", argv[3]);  // the lock folder's root
   std::cout << "trying" << std::endl;
   try {
     if (mode == "reader") {

@@ -129,7 +129,7 @@ TEST_F(DeletedKeyFileTest, AFailedWriteKeepsTheOldListAndLeavesNoTemporaryFile) 
 TEST_F(DeletedKeyFileTest, ChangesWaitForReadersAndReadsWaitForChanges) {
   CLockManager::ScaleTimeoutsForTesting(0.002);
   DeleteKey(defs_, "books", 10, true);
-  CLockManager other("PUBLIC", "BOOKS", kLockDeletedKeys);
+  CLockManager other(home_.Data(), "PUBLIC", "BOOKS", kLockDeletedKeys);
   other.LockReader();  // a search reading BOOKS.del
   const auto chain = RaisedChain<CPiDeleteException>([&] { DeleteKey(defs_, "books", 20, true); });
   ASSERT_EQ(chain.size(), 2u);

@@ -151,7 +151,7 @@ TEST_F(FindexBuildTest, FailedBuildsLeaveTheFindexAsItWasAndNoTemporaryFile) {
   FindexLimits few_bytes;
   few_bytes.max_fst_bytes = 500;
   int renames = 0;
-  CLockManager reader("PUBLIC", "Books", kLockFindex);
+  CLockManager reader(home_.Data(), "PUBLIC", "Books", kLockFindex);
   const std::vector<Case> cases = {
       {"block numbers", [&] { SetFindexLimitsForTesting(few_blocks); }, Words("x", 300, 400),
        "16-bit block numbers"},
@@ -223,7 +223,7 @@ TEST_F(FindexBuildTest, ReadersUnderTheFindexLockSeeTheWholeOldOrNewFindex) {
   std::vector<std::string> seen_faults;
   std::thread reader([&] {
     while (building.load()) {
-      CLockManager lock("PUBLIC", "Books", kLockFindex);
+      CLockManager lock(home_.Data(), "PUBLIC", "Books", kLockFindex);
       lock.LockReader();
       const test::DecodedFindex decoded = Decode("BOOKS");
       lock.UnlockReaders();

@@ -373,7 +373,7 @@ TEST_P(FindexUpdateTest, AKeyDeletedWhileARebuildRunsStaysDeletedAfterIt) {
   ASSERT_EQ(Run("CREATE FINDEX " + name + " ON TABLE " + rows + " COLUMNS body KEY id"), "");
   // A search holds the rebuild back just before it moves into place, after
   // it has read row 3.
-  CLockManager search("PUBLIC", name, kLockFindex);
+  CLockManager search(home_.Data(), "PUBLIC", name, kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name + " REBUILD"), 0), S_OK);
   WaitForTrace("Renaming index: " + name, 2);  // the CREATE's, then the rebuild's
@@ -440,7 +440,7 @@ TEST_P(FindexUpdateTest, AnAddOnIsSwappedInOnlyWhenNoSearchReadsItsFindex) {
   Insert(rows, WordRows(701, 703));
   // A search of the findex holds a reader unit of its findex lock; the add-on
   // files are read under that lock.
-  CLockManager search("PUBLIC", name, kLockFindex);
+  CLockManager search(home_.Data(), "PUBLIC", name, kLockFindex);
   search.LockReader();
   ASSERT_EQ(command_->ExecuteEx(T("UPDATE FINDEX " + name), 0), S_OK);
   const std::string add_on = ToUpper(name) + "_ADD_1";

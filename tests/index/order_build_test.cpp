@@ -253,7 +253,7 @@ TEST_P(OrderBuildTestSqlite, MovesAndDropsWaitForTheReadersOfTheOrder) {
   CLockManager::ScaleTimeoutsForTesting(0.001);
   {
     // A search reading the order holds a reader unit of its kind 3 lock.
-    CLockManager reader("PUBLIC", "locked", kLockOrder);
+    CLockManager reader(home_.Data(), "PUBLIC", "locked", kLockOrder);
     reader.LockReader();
     EXPECT_EQ(Failure(Order("Locked", t, {"label"}), false),
               "Could not get exclusive access to order LOCKED to put the new build in place "

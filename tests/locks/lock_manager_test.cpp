@@ -1,6 +1,7 @@
 // Cross-process behaviour of the index locks: other processes are lock_holder
 // helpers that take one lock and keep it until their stdin closes.
 #include "locks/lock_manager.h"
+#include "platform/named_lock.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -27,6 +28,8 @@ namespace fs = std::filesystem;
 
 constexpr double kShort = 0.002;  // writer 100 ms, reader unit 20 ms
 const std::string kName = "MORVIL_2__ARTICLES";
+// The lock folder's root: each test points MORVIL_LOCKDIR at a folder of its own.
+const std::string kScope;
 
 class OtherProcess {
  public:
@@ -104,7 +107,7 @@ std::string FailureOf(Op op) {
 std::vector<std::unique_ptr<CLockManager>> TakeReaders(int n) {
   std::vector<std::unique_ptr<CLockManager>> readers;
   for (int i = 0; i < n; ++i) {
-    readers.push_back(std::make_unique<CLockManager>(kName));
+    readers.push_back(std::make_unique<CLockManager>(kScope, kName));
     readers.back()->LockReader();
   }
   return readers;
@@ -133,16 +136,16 @@ class LockManagerTest : public ::testing::Test {
 };
 
 TEST_F(LockManagerTest, LockNames) {
-  CLockManager findex("", "articles", kLockFindex);
+  CLockManager findex(kScope, "", "articles", kLockFindex);
   EXPECT_EQ(findex.GetLockName(), kName);
-  EXPECT_EQ(CLockManager("public", "Orders", kLockOrder).GetLockName(), "MORVIL_3_PUBLIC_ORDERS");
+  EXPECT_EQ(CLockManager(kScope, "public", "Orders", kLockOrder).GetLockName(), "MORVIL_3_PUBLIC_ORDERS");
   findex.SetName("Public", "généralités", kLockDeletedKeys, 3);
   EXPECT_EQ(findex.GetLockName(), "MORVIL_1_PUBLIC_GÉNÉRALITÉS");
 }
 
 TEST_F(LockManagerTest, LockFilesAreOpenToEveryAccountAndNotInherited) {
   const mode_t old_umask = umask(077);
-  CLockManager lock("", "articles", kLockFindex);
+  CLockManager lock(kScope, "", "articles", kLockFindex);
   lock.LockExclusive();
   umask(old_umask);
   struct stat st {};
@@ -169,11 +172,11 @@ TEST_F(LockManagerTest, NamesThatCannotStandAsFileNamesAreDistinctLocks) {
                                           std::string(300, 'x') + "2"};
   std::vector<std::unique_ptr<CLockManager>> held;
   for (const auto& name : names) {
-    held.push_back(std::make_unique<CLockManager>(name));
+    held.push_back(std::make_unique<CLockManager>(kScope, name));
     ASSERT_NO_THROW(held.back()->LockWriter()) << name;
   }
   for (const auto& name : names) {
-    CLockManager again(name);
+    CLockManager again(kScope, name);
     EXPECT_EQ(FailureOf([&] { again.LockWriter(); }).rfind("Timeout waiting for write", 0), 0u)
         << name;
   }
@@ -190,7 +193,7 @@ TEST_F(LockManagerTest, ReadersAndWritersExcludeEachOtherAcrossProcesses) {
   {
     OtherProcess builder(kShort, "exclusive");
     ASSERT_EQ(builder.Outcome(), "held");
-    CLockManager search(kName);
+    CLockManager search(kScope, kName);
     EXPECT_EQ(FailureOf([&] { search.LockReader(); }), kSingleRead);
     EXPECT_EQ(FailureOf([&] { search.LockWriter(); }), kWrite);
     EXPECT_EQ(builder.Release(), 0);
@@ -199,14 +202,14 @@ TEST_F(LockManagerTest, ReadersAndWritersExcludeEachOtherAcrossProcesses) {
   {
     OtherProcess search(kShort, "reader");
     ASSERT_EQ(search.Outcome(), "held");
-    CLockManager builder(kName);
+    CLockManager builder(kScope, kName);
     EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), kAllRead);
   }
   {
     // The writer alone keeps out writers, not readers.
     OtherProcess sync(kShort, "writer");
     ASSERT_EQ(sync.Outcome(), "held");
-    CLockManager search(kName);
+    CLockManager search(kScope, kName);
     EXPECT_NO_THROW(search.LockReader());
     OtherProcess second_sync(kShort, "writer");
     EXPECT_EQ(second_sync.Outcome(), "failed " + kWrite);
@@ -217,7 +220,7 @@ TEST_F(LockManagerTest, HundredReaderUnits) {
   OtherProcess first(kShort, "reader");
   ASSERT_EQ(first.Outcome(), "held");
   const auto readers = TakeReaders(99);
-  CLockManager extra(kName);
+  CLockManager extra(kScope, kName);
   EXPECT_EQ(FailureOf([&] { extra.LockReader(); }), kSingleRead);
   OtherProcess builder(kShort, "all");
   EXPECT_EQ(builder.Outcome(), "failed " + kAllRead);
@@ -229,14 +232,14 @@ TEST_F(LockManagerTest, KilledHolderReleasesAtOnce) {
   OtherProcess builder(kShort, "exclusive");
   ASSERT_EQ(builder.Outcome(), "held");
   builder.Kill();
-  CLockManager next(kName);
+  CLockManager next(kScope, kName);
   EXPECT_NO_THROW(next.LockExclusive());
   EXPECT_TRUE(next.HoldsWriter());
   EXPECT_EQ(next.ReaderCount(), 100);
 }
 
 TEST_F(LockManagerTest, SameNameObjectsInOneProcess) {
-  CLockManager first(kName), second(kName), third(kName);
+  CLockManager first(kScope, kName), second(kScope, kName), third(kScope, kName);
   first.LockReader();
   second.LockReader();
   EXPECT_EQ(FailureOf([&] { third.LockExclusive(); }), kAllRead);
@@ -255,7 +258,7 @@ TEST_F(LockManagerTest, SameNameObjectsInOneProcess) {
 TEST_F(LockManagerTest, FailedExclusiveLockLeavesNothingHeld) {
   OtherProcess search(kShort, "reader");
   ASSERT_EQ(search.Outcome(), "held");
-  CLockManager builder(kName);
+  CLockManager builder(kScope, kName);
   EXPECT_EQ(FailureOf([&] { builder.LockExclusive(); }), kAllRead);
   {
     OtherProcess writer(kShort, "writer");
@@ -282,7 +285,7 @@ TEST_F(LockManagerTest, WaitersTakeTheLockOnceReleased) {
 }
 
 TEST_F(LockManagerTest, ReleasesAreExplicitAndSeparate) {
-  auto lock = std::make_unique<CLockManager>("", "articles", kLockFindex);
+  auto lock = std::make_unique<CLockManager>(kScope, "", "articles", kLockFindex);
   lock->LockExclusive();
   // A forked copy of the descriptors must not keep a released lock alive.
   int gate[2];
@@ -297,24 +300,46 @@ TEST_F(LockManagerTest, ReleasesAreExplicitAndSeparate) {
   close(gate[0]);
   // Giving back the readers keeps the writer.
   lock->UnlockReaders();
-  EXPECT_EQ(FailureOf([] { CLockManager(kName).LockWriter(); }), kWrite);
-  EXPECT_NO_THROW(CLockManager(kName).LockAllReaders());
+  EXPECT_EQ(FailureOf([] { CLockManager(kScope, kName).LockWriter(); }), kWrite);
+  EXPECT_NO_THROW(CLockManager(kScope, kName).LockAllReaders());
   lock->LockAllReaders();
   lock->SetName("", "orders", kLockOrder);
   EXPECT_FALSE(lock->HoldsWriter());
   EXPECT_EQ(lock->ReaderCount(), 0);
-  EXPECT_NO_THROW(CLockManager(kName).LockExclusive());
+  EXPECT_NO_THROW(CLockManager(kScope, kName).LockExclusive());
   close(gate[1]);
   waitpid(copy, nullptr, 0);
   lock->LockExclusive();
   lock.reset();
-  EXPECT_NO_THROW(CLockManager("MORVIL_3__ORDERS").LockExclusive());
+  EXPECT_NO_THROW(CLockManager(kScope, "MORVIL_3__ORDERS").LockExclusive());
+}
+
+// Locks are scoped by data directory: a builder in one directory never waits
+// for a lock of the same name in another, and every path to one directory
+// (a symbolic link, a trailing slash) shares its locks.
+TEST_F(LockManagerTest, DataDirectoriesScopeTheirLocks) {
+  const std::string first = scratch_.Path() + "first", second = scratch_.Path() + "second";
+  fs::create_directories(first);
+  fs::create_directories(second);
+  fs::create_directory_symlink(first, scratch_.Path() + "link");
+  CLockManager holder(first, "PUBLIC", "Docs", kLockFindex);
+  holder.LockExclusive();
+  EXPECT_NO_THROW(CLockManager(second, "PUBLIC", "Docs", kLockFindex).LockExclusive());
+  for (const std::string& same : {first + "/", scratch_.Path() + "link"}) {
+    CLockManager other(same, "PUBLIC", "Docs", kLockFindex);
+    EXPECT_EQ(FailureOf([&] { other.LockWriter(); }),
+              Msg("Timeout waiting for write access to an index. Lock name: MORVIL_2_PUBLIC_DOCS",
+                  "LockWriter"))
+        << same;
+  }
+  EXPECT_NE(platform::NamedLock::LockFolder(first), platform::NamedLock::LockFolder(second));
+  EXPECT_EQ(platform::NamedLock::LockFolder(first).rfind(lock_dir_, 0), 0u);
 }
 
 TEST_F(LockManagerTest, CreationFailuresNameTheLock) {
   test::WriteFile(scratch_.Path() + "plain", "not a folder");
   setenv("MORVIL_LOCKDIR", (scratch_.Path() + "plain/locks").c_str(), 1);
-  CLockManager lock("", "articles", kLockFindex);
+  CLockManager lock(kScope, "", "articles", kLockFindex);
   EXPECT_EQ(FailureOf([&] { lock.LockExclusive(); }),
             Msg("Error creating mutex: " + kName, "CreateWriterMutex"));
   EXPECT_EQ(FailureOf([&] { lock.LockReader(); }),

@@ -163,7 +163,9 @@ TEST_F(DocConverterTest, FailingProgramsFailTheConversion) {
             std::string::npos)
       << fail;
 
-  SetConverterTimeoutForTesting(std::chrono::milliseconds(300));
+  // Long enough for the helper to start and write its process id on a busy
+  // machine (a sanitizer build starts slowly); the kill is what is checked.
+  SetConverterTimeoutForTesting(std::chrono::milliseconds(2000));
   const std::string hang_text = FailureText([&] { converter.ConvertForIndexing(Document("b.hang", "x")); });
   EXPECT_NE(hang_text.find("- Error Code: -1 (Module:STDFUN,Method:ConvertText)"), std::string::npos)
       << hang_text;

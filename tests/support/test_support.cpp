@@ -32,6 +32,21 @@ void SetOrUnset(const std::string& name, const std::string& value, bool set) {
 
 }  // namespace
 
+ProcessIsolation::ProcessIsolation() {
+  std::string pattern = ScratchRoot() + "/qm-test-XXXXXX";
+  std::vector<char> buffer(pattern.begin(), pattern.end());
+  buffer.push_back('\0');
+  if (mkdtemp(buffer.data()) == nullptr) throw std::runtime_error("mkdtemp failed: " + pattern);
+  root_ = buffer.data();
+  setenv("QM_TEST_SCRATCH", root_.c_str(), 1);
+  setenv("MORVIL_LOCKDIR", (root_ + "/locks/").c_str(), 1);
+}
+
+ProcessIsolation::~ProcessIsolation() {
+  std::error_code ec;
+  fs::remove_all(root_, ec);
+}
+
 ScratchDir::ScratchDir(const std::string& name) {
   std::string pattern = ScratchRoot() + "/qm-" + name + "-XXXXXX";
   std::vector<char> buffer(pattern.begin(), pattern.end());

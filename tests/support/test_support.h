@@ -9,6 +9,20 @@
 
 namespace qm::test {
 
+// Gives the test process a private scratch root (QM_TEST_SCRATCH) and lock
+// folder (MORVIL_LOCKDIR), below the scratch root it was started with; the
+// child processes a test starts inherit both. Removed when the object dies.
+class ProcessIsolation {
+ public:
+  ProcessIsolation();
+  ~ProcessIsolation();
+  ProcessIsolation(const ProcessIsolation&) = delete;
+  ProcessIsolation& operator=(const ProcessIsolation&) = delete;
+
+ private:
+  std::string root_;
+};
+
 // A fresh folder below the test scratch root, removed when the object dies.
 class ScratchDir {
  public:

@@ -60,7 +60,7 @@ void CGiOrder::OpenOrder(std::string_view name, int32_t mode) {
     Close();
     const order_files::OrderPaths paths = order_files::PathsOf(defs_, name);
     try {
-      lock_ = std::make_unique<CLockManager>(defs_.GetGroup(), name, kLockOrder);
+      lock_ = std::make_unique<CLockManager>(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
       lock_->LockReader();
       sri_.OpenFile(paths.sri, BFile::kReadOnly, order_files::kBlockUnits);
       try {

@@ -31,11 +31,6 @@ constexpr int32_t kNull = 2147483647;
 class AttachedOrderTest : public test::CommandFixture {
  protected:
   void SetUp() override {
-    // Locks of its own: other test processes build and read orders of
-    // these names at the same time.
-    if (const char* dir = std::getenv("MORVIL_LOCKDIR")) saved_lock_dir_ = dir;
-    fs::create_directories(locks_.Path());
-    setenv("MORVIL_LOCKDIR", locks_.Path().c_str(), 1);
     CommandFixture::SetUp();
     ASSERT_TRUE(LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini"));
     UseSqlite();
@@ -59,11 +54,6 @@ class AttachedOrderTest : public test::CommandFixture {
   void TearDown() override {
     order_.reset();
     CommandFixture::TearDown();
-    if (saved_lock_dir_) {
-      setenv("MORVIL_LOCKDIR", saved_lock_dir_->c_str(), 1);
-    } else {
-      unsetenv("MORVIL_LOCKDIR");
-    }
   }
 
   // Result rows of keys only, in this order; key 9 is in no order.
@@ -111,8 +101,6 @@ class AttachedOrderTest : public test::CommandFixture {
 
   std::string OrderFolder() const { return GroupFolder() + "Orders/"; }
 
-  test::ScratchDir locks_{"locks"};
-  std::optional<std::string> saved_lock_dir_;
   CGlobalDefs defs_;
   RowsetOrderContext context_;
   std::unique_ptr<CGiRowsetOrder> order_ = std::make_unique<CGiRowsetOrder>(defs_);
@@ -262,7 +250,7 @@ TEST_F(AttachedOrderTest, AnAttachedOrderKeepsItsFilesFromBeingSwappedUntilReset
   Order(rows, "ITEMS.N");
   CLockManager::ScaleTimeoutsForTesting(0.01);
   const std::string refused = Run("CREATE ORDER Items ON TABLE items COLUMNS n KEY id");
-  CLockManager writer("PUBLIC", "ITEMS", kLockOrder);
+  CLockManager writer(home_.Data(), "PUBLIC", "ITEMS", kLockOrder);
   EXPECT_THROW(writer.LockExclusive(), CLockManagerException);
   order_->Reset("id");
   EXPECT_NO_THROW(writer.LockExclusive());

@@ -96,6 +96,21 @@ void RequireBuildableOrder(const COrderInfo& definition, const CGlobalDefs& defs
 
 namespace {
 
+// A definition read back from a header for a rebuild. A header that no
+// longer reads has lost it: the way out is a drop and a CREATE that names it.
+template <class Read>
+auto StoredDefinition(std::string_view what, std::string_view name, bool there, Read&& read) {
+  try {
+    return read();
+  } catch (const CExceptionBase& e) {
+    if (!there) throw;
+    throw CPiStartPointException::Text(
+        "The definition of %s %s cannot be read from its header: drop it and create it again "
+        "with its whole definition",
+        kExecuteW, &e, what, ShowName(name));
+  }
+}
+
 std::string UpperTags(const TagMap& tags) {
   std::string out;
   for (const auto& [tag, value] : tags) {
@@ -262,12 +277,13 @@ void CommandExecution::BuildFindex(Command& command) {
 
   if (rebuild && stored) {
     // CREATE FINDEX name, UPDATE FINDEX name REBUILD.
-    definition = ReadFindexHeader(defs_, name);
+    definition = StoredDefinition("findex", name, FindexFilesExist(defs_, name),
+                                  [&] { return ReadStoredDefinition(defs_, name); });
   } else if (rebuild && update) {
     // UPDATE ... ON TABLE ... REBUILD: the statement's options over the
     // stored definition, which keeps what a statement cannot name (the
     // date/time update key, the stored connection).
-    CIndexHeader existing = ReadFindexHeader(defs_, name);
+    CIndexHeader existing = ReadStoredDefinition(defs_, name);
     RequireUpdatableBy(definition, existing);
     definition = std::move(existing);
     index_options_.CopyTo(definition);
@@ -329,7 +345,9 @@ void CommandExecution::BuildOrder(Command& command) {
   if (command.type == kCmdOrderStored) {
     // CREATE ORDER name and UPDATE ORDER name work from the stored definition,
     // its options and its type included.
-    definition = order_files::ReadInfoShared(defs_, name);
+    const bool there = platform::FileExists(order_files::PathsOf(defs_, name).sri);
+    definition = StoredDefinition("order", name, there,
+                                  [&] { return order_files::ReadInfoShared(defs_, name); });
   } else {
     definition.OrderType = 0;
   }
@@ -359,9 +377,10 @@ void CommandExecution::DropFindex(const std::string& name) {
   findex_lock.LockExclusive();
   CLockManager deleted_keys_lock(defs_.GetLockScope(), group, name, kLockDeletedKeys);
   deleted_keys_lock.LockExclusive();
+  // Whatever files are there go, damaged ones too: a findex that no longer
+  // opens must still be removable.
   CPiFIndex findex(defs_);
-  findex.Open(name, 3);
-  findex.DropFindex();
+  findex.DropFindexFiles(name);
 }
 
 void CommandExecution::DropOrder(const std::string& name) {
@@ -370,9 +389,9 @@ void CommandExecution::DropOrder(const std::string& name) {
   // A drop never races a build of the same order; searches are waited for
   // under the order's kind 3 lock, which DropOrder takes.
   const CommandLock order_lock(defs_, kCmdOrderDefined, name);
+  // Whatever files are there go, damaged ones too.
   CPiOrder order(defs_);
-  order.OpenOrder(name, CPiOrder::kModeRead);
-  order.DropOrder();
+  order.DropOrderFiles(name);
 }
 
 void CommandExecution::DeleteKey(const Command& command) {

@@ -1,9 +1,13 @@
 #include "command/findex_column_parser.h"
 
+#include <algorithm>
+#include <iterator>
+
 #include "base/error_numbers.h"
 #include "command/quoted_text.h"
 #include "platform/text_encoding.h"
 #include "base/exception_family.h"
+#include "sources/column_conversion.h"
 
 namespace qm {
 
@@ -12,6 +16,27 @@ namespace {
 
 std::string CleanName(std::u16string_view text) {
   return Utf16ToUtf8(UnquoteValue(TrimSpaces(text)));
+}
+
+// A tag that no build reads, or a weight that is no whole number, would be
+// ignored silently and give a findex other than the one asked for.
+void RequireKnownTag(const std::string& column, const std::string& tag, const std::string& value,
+                     const char* method) {
+  static constexpr std::string_view kTags[] = {"CONTENT_WEIGHT", "CONTENT_TYPE", "BASE_URL",
+                                               "BASE_FILE_PATH", "DOCUMENT_TYPE"};
+  const std::string upper = AsciiUpper(tag);
+  if (std::find(std::begin(kTags), std::end(kTags), upper) == std::end(kTags)) {
+    throw CPiCmdException::Text(
+        "Unknown column tag %s on column %s: a column takes CONTENT_WEIGHT, CONTENT_TYPE, "
+        "BASE_URL, BASE_FILE_PATH and DOCUMENT_TYPE",
+        method, nullptr, tag, column);
+  }
+  int64_t weight = 0;
+  if (upper == "CONTENT_WEIGHT" && !ParseInteger64(value, weight)) {
+    throw CPiCmdException::Text(
+        "Column tag CONTENT_WEIGHT on column %s takes a whole number, not \"%s\"", method, nullptr,
+        column, value);
+  }
 }
 
 }  // namespace
@@ -34,7 +59,9 @@ void ParseFindexColumns(std::u16string_view columns, ColumnMap& column_map, cons
         if (equals == std::u16string_view::npos) throw reject();
         std::string tag_name = CleanName(tag.substr(0, equals));
         if (tag_name.empty()) throw reject();
-        tags.insert_or_assign(std::move(tag_name), CleanName(tag.substr(equals + 1)));
+        std::string value = CleanName(tag.substr(equals + 1));
+        RequireKnownTag(name, tag_name, value, method);
+        tags.insert_or_assign(std::move(tag_name), std::move(value));
       }
       result.insert_or_assign(std::move(name), std::move(tags));
     }

@@ -16,6 +16,7 @@
 #include "config/file_operations.h"
 #include "config/global_defs.h"
 #include "base/plain_name.h"
+#include "config/temp_file_claim.h"
 #include "config/win_file.h"
 
 namespace qm {
@@ -106,23 +107,24 @@ class TempFile {
         "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
     thread_local std::mt19937 random{std::random_device{}()};
     std::uniform_int_distribution<std::size_t> pick(0, kChars.size() - 1);
-    platform::FileHandle file;
+    std::optional<TempFileClaim> claim;
     std::string path;
-    for (int attempt = 0; attempt < kTempNameAttempts && !file.IsOpen(); ++attempt) {
+    for (int attempt = 0; attempt < kTempNameAttempts && !claim; ++attempt) {
       path = folder + "tmp";
       for (int i = 0; i < 6; ++i) path += kChars[pick(random)];
-      file = platform::OpenFileAs(path, platform::FileAccess::Write,
-                                  platform::FileDisposition::CreateNew);
-      if (!file.IsOpen() && errno != EEXIST) break;
+      // Locked while it exists: a sweep never takes it for a dead writer's.
+      claim = TempFileClaim::Create(path);
+      if (!claim && errno != EEXIST) break;
     }
-    if (!file.IsOpen()) {
+    if (!claim) {
       throw CPiDeleteException::Text("Error creating file: %s", method, nullptr, path);
     }
     path_ = path;
+    claim_ = std::move(*claim);
     // The data reaches the disk before the rename publishes it: after a crash
     // the list is the old one or the new one, never an empty file.
-    if (!platform::WriteAll(file.Get(), bytes.data(), bytes.size()) ||
-        !platform::SyncFileData(file.Get()) || file.Close() != 0) {
+    if (!platform::WriteAll(claim_.Get(), bytes.data(), bytes.size()) ||
+        !platform::SyncFileData(claim_.Get())) {
       throw CPiDeleteException::Text("Error writing to file: %s", method, nullptr, path_);
     }
   }
@@ -132,6 +134,7 @@ class TempFile {
 
  private:
   std::string path_;
+  TempFileClaim claim_;  // released after the file is renamed or removed
 };
 
 // Holds the exclusive kind 1 lock of a findex for a scope.

@@ -1,6 +1,7 @@
 #include "index/file_swap.h"
 
 #include <mutex>
+#include <optional>
 
 #include "platform/file_io.h"
 #include "config/file_operations.h"
@@ -30,7 +31,9 @@ void Rename(const std::string& from, const std::string& to) {
 
 void Renames::SetAside(const std::string& target, const std::string& backup) {
   if (!platform::FileExists(target)) return;
+  std::optional<TempFileClaim> hold = TempFileClaim::Hold(target);
   Move(target, backup);
+  if (hold) held_.push_back(std::move(*hold));
   backups_.push_back(backup);
 }
 
@@ -50,11 +53,13 @@ void Renames::Undo() {
   }
   done_.clear();
   backups_.clear();
+  held_.clear();
 }
 
 void Renames::DropBackups() {
   for (const std::string& backup : backups_) DropQuietly(backup, error_tag_);
   backups_.clear();
+  held_.clear();
 }
 
 void DropQuietly(const std::string& path, const char* error_tag) {

@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "config/temp_file_claim.h"
 #include "locks/lock_manager.h"
 #include "base/exception_family.h"
 
@@ -35,6 +36,9 @@ class Renames {
   const char* error_tag_;
   std::vector<std::pair<std::string, std::string>> done_;  // from, to
   std::vector<std::string> backups_;
+  // The files set aside carry temporary names: locked until the swap ends,
+  // so a sweep takes them only from a swap that died.
+  std::vector<TempFileClaim> held_;
 };
 
 // Deletes path; a failure is traced under error_tag: the swap it belongs to

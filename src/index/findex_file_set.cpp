@@ -10,6 +10,8 @@
 #include "base/exception_family.h"
 #include "config/file_operations.h"
 #include "config/global_defs.h"
+#include "config/temp_file_sweep.h"
+#include "base/trace.h"
 #include "base/plain_name.h"
 
 namespace qm::findex {
@@ -19,13 +21,21 @@ namespace {
 constexpr const char* kRenameMethod = "RenameIndex";
 constexpr const char* kErrorTag = "PILIB_ERROR.PiFindex.RenameIndex";
 
-void DropAddOns(const CGlobalDefs& defs, std::string_view name) {
+// The add-on pairs of name, n = 1, 2, ... while one of the pair exists.
+std::vector<std::string> AddOnFiles(const CGlobalDefs& defs, std::string_view name) {
+  std::vector<std::string> files;
   for (int32_t n = 1;; ++n) {
     const FilePaths add_on = PathsOf(defs, AddOnName(name, n));
-    if (!platform::FileExists(add_on.fst) && !platform::FileExists(add_on.sdx)) return;
-    DropFile(add_on.fst);
-    DropFile(add_on.sdx);
+    const bool fst = platform::FileExists(add_on.fst);
+    const bool sdx = platform::FileExists(add_on.sdx);
+    if (!fst && !sdx) return files;
+    if (fst) files.push_back(add_on.fst);
+    if (sdx) files.push_back(add_on.sdx);
   }
+}
+
+void DropAddOns(const CGlobalDefs& defs, std::string_view name) {
+  for (const std::string& path : AddOnFiles(defs, name)) DropFile(path);
 }
 
 }  // namespace
@@ -95,12 +105,31 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
   }
 }
 
-void DropFiles(const CGlobalDefs& defs, std::string_view name) {
+std::vector<std::string> ExistingFiles(const CGlobalDefs& defs, std::string_view name) {
   const FilePaths paths = PathsOf(defs, name);
-  DropFile(paths.del);
-  DropAddOns(defs, name);
-  DropFile(paths.fst);
-  DropFile(paths.sdx);
+  std::vector<std::string> files;
+  if (platform::FileExists(paths.del)) files.push_back(paths.del);
+  for (std::string& path : AddOnFiles(defs, name)) files.push_back(std::move(path));
+  for (const std::string* path : {&paths.fst, &paths.sdx}) {
+    if (platform::FileExists(*path)) files.push_back(*path);
+  }
+  return files;
+}
+
+std::vector<std::string> DropFiles(const CGlobalDefs& defs, std::string_view name) {
+  const std::vector<std::string> files = ExistingFiles(defs, name);
+  for (const std::string& path : files) DropFile(path);
+  return files;
+}
+
+std::vector<std::string> RemoveOrphanedTempFiles(const CGlobalDefs& defs) {
+  const std::vector<std::string> removed =
+      SweepOrphanedTempFiles(defs.GetFullDataPath(FolderKind::Indexes));
+  for (const std::string& path : removed) {
+    Trace(true, "PILIB.PiFindex.RemoveTempFiles", "Removed temporary file of a killed build: %s",
+          path);
+  }
+  return removed;
 }
 
 }  // namespace qm::findex

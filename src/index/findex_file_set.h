@@ -11,6 +11,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace qm {
 
@@ -53,9 +54,18 @@ void MoveIntoPlace(const CGlobalDefs& defs, std::string_view name, const std::st
                    const std::string& temp_fst, bool rebuild);
 
 // Deletes name.del, every name_ADD_n pair (n = 1, 2, ... while one exists)
-// and name's pair. REQUIRES: the caller holds the exclusive kind 2 and kind 1
-// locks of the findex.
-void DropFiles(const CGlobalDefs& defs, std::string_view name);
+// and name's pair, whichever of them exist, whatever their state; returns
+// the paths deleted. REQUIRES: the caller holds the exclusive kind 2 and
+// kind 1 locks of the findex.
+std::vector<std::string> DropFiles(const CGlobalDefs& defs, std::string_view name);
+
+// The files of name that exist: name's pair, name.del and the add-on pairs,
+// in the order DropFiles deletes them.
+std::vector<std::string> ExistingFiles(const CGlobalDefs& defs, std::string_view name);
+
+// Removes the temporaries of the group's Indexes folder that no running build
+// holds (files left by killed builds), tracing each; returns their paths.
+std::vector<std::string> RemoveOrphanedTempFiles(const CGlobalDefs& defs);
 
 }  // namespace findex
 }  // namespace qm

@@ -5,6 +5,8 @@
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
 #include "config/global_defs.h"
+#include "format/bfile.h"
+#include "format/findex_tree.h"
 
 namespace qm {
 
@@ -18,6 +20,15 @@ CIndexHeader ReadFindexHeader(CGlobalDefs& defs, std::string_view name) {
   findex.Open(name, 3);
   CIndexHeader header = findex.Header();
   findex.Close();
+  return header;
+}
+
+CIndexHeader ReadStoredDefinition(const CGlobalDefs& defs, std::string_view name) {
+  findex::CheckFindexName(name, "Open");
+  BFile sdx;
+  sdx.OpenFile(findex::PathsOf(defs, name).sdx, BFile::kReadOnly, CFindexTreeWriter::kBlockUnits);
+  CIndexHeader header;
+  header.ReadInfo(sdx);
   return header;
 }
 

@@ -18,6 +18,10 @@ bool FindexFilesExist(const CGlobalDefs& defs, std::string_view name);
 // holds what keeps the files from being swapped meanwhile (the findex's
 // CREATE command lock, or a reader unit of its findex lock).
 CIndexHeader ReadFindexHeader(CGlobalDefs& defs, std::string_view name);
+// The definition stored in block 0 of the findex's word tree alone, for a
+// rebuild: the rest of the files may be damaged or missing, as the rebuild
+// replaces them. Same REQUIRES as ReadFindexHeader.
+CIndexHeader ReadStoredDefinition(const CGlobalDefs& defs, std::string_view name);
 // The same under a reader unit of the findex lock, for callers that hold none.
 CIndexHeader ReadFindexHeaderShared(CGlobalDefs& defs, std::string_view name);
 

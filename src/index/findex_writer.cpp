@@ -1,5 +1,8 @@
 #include "index/findex_writer.h"
 
+#include <cerrno>
+#include <optional>
+
 #include "base/error_numbers.h"
 #include "index/findex_file_set.h"
 #include "index/findex_files_writer.h"
@@ -8,6 +11,8 @@
 #include "format/bfile.h"
 #include "base/exception_family.h"
 #include "config/file_operations.h"
+#include "config/temp_file_claim.h"
+#include "config/temp_file_sweep.h"
 #include "config/temp_names.h"
 #include "base/trace.h"
 
@@ -35,6 +40,10 @@ struct CPiFIndex::State {
   CIndexHeader header;
   std::string temp_sdx;  // mode 4: the build files until they are moved into place
   std::string temp_fst;
+  // Held while the build files exist, so a sweep never takes them for a
+  // killed build's.
+  TempFileClaim sdx_claim;
+  TempFileClaim fst_claim;
 };
 
 CPiFIndex::CPiFIndex(CGlobalDefs& defs) : defs_(defs), state_(std::make_unique<State>()) {}
@@ -51,9 +60,26 @@ void CPiFIndex::Open(std::string_view name, int32_t mode) {
       const std::string folder = defs_.GetFullDataPath(FolderKind::Indexes);
       for (int attempt = 1;; ++attempt) {
         const std::string base = folder + SLGetTempFileName(defs_, true, kTempCallerFindexFiles);
-        if (!platform::FileExists(base + ".tmp1") && !platform::FileExists(base + ".tmp2")) {
+        std::optional<TempFileClaim> sdx = TempFileClaim::Create(base + ".tmp1");
+        if (!sdx && errno != EEXIST) {
+          throw CPiFIndexException::Text(kOpenFailureText, "Open", nullptr, base + ".tmp1");
+        }
+        std::optional<TempFileClaim> fst;
+        if (sdx) {
+          fst = TempFileClaim::Create(base + ".tmp2");
+          if (!fst) {
+            const int error = errno;
+            platform::UnlinkFile(base + ".tmp1");
+            if (error != EEXIST) {
+              throw CPiFIndexException::Text(kOpenFailureText, "Open", nullptr, base + ".tmp2");
+            }
+          }
+        }
+        if (fst) {
           state_->temp_sdx = base + ".tmp1";
           state_->temp_fst = base + ".tmp2";
+          state_->sdx_claim = std::move(*sdx);
+          state_->fst_claim = std::move(*fst);
           break;
         }
         if (attempt == kTempNameAttempts) {
@@ -100,6 +126,8 @@ void CPiFIndex::Close() {
     }
     path->clear();
   }
+  state_->sdx_claim.Release();
+  state_->fst_claim.Release();
   state_->mode = 0;
 }
 
@@ -111,6 +139,7 @@ const CIndexHeader& CPiFIndex::Header() const {
 void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
   Guarded("BuildRowFindex", [&] {
     findex::CheckFindexName(definition.IndexName, "BuildRowFindex");
+    findex::RemoveOrphanedTempFiles(defs_);
     MFile sorted;  // delete-on-close: gone once closed
     int64_t rows = 0;
     try {
@@ -170,6 +199,27 @@ void CPiFIndex::DropFindex() {
     const std::string name = state_->name;
     Close();
     findex::DropFiles(defs_, name);
+  });
+}
+
+std::vector<std::string> CPiFIndex::DropFindexFiles(std::string_view name) {
+  return Guarded("DropFindex", [&] {
+    findex::CheckFindexName(name, "DropFindex");
+    if (findex::IsAddOnName(name)) throw CPiFIndexException::Numbered(44, "DropFindex", nullptr);
+    Close();
+    if (findex::ExistingFiles(defs_, name).empty()) {
+      // Nothing to drop: the same failure as any use of a missing findex.
+      Open(name, kModeRead);
+      Close();
+    }
+    std::vector<std::string> removed = findex::DropFiles(defs_, name);
+    for (const std::string& path : removed) {
+      Trace(defs_.TraceLevel1(), "PILIB.PiFindex.DropFindex", "Dropped file %s", path);
+    }
+    for (std::string& path : findex::RemoveOrphanedTempFiles(defs_)) {
+      removed.push_back(std::move(path));
+    }
+    return removed;
   });
 }
 

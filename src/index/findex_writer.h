@@ -10,6 +10,7 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "config/global_defs.h"
 #include "format/index_header.h"
@@ -56,6 +57,11 @@ class CPiFIndex {
   // name ("_ADD_") raises error 44. REQUIRES: the caller holds the exclusive
   // kind 2 and kind 1 locks of the findex (DROP FINDEX takes them).
   void DropFindex();
+  // Removes whatever files of the findex name exist (pair, add-ons, deleted
+  // keys), also damaged ones that no longer open, tracing each; returns their
+  // paths. A name without any file raises what opening it raises; an add-on
+  // name error 44. REQUIRES: the locks of DropFindex.
+  std::vector<std::string> DropFindexFiles(std::string_view name);
 
  private:
   struct State;

@@ -1,6 +1,7 @@
 #include "index/order_file_set.h"
 
 #include <cerrno>
+#include <optional>
 #include <set>
 #include <utility>
 
@@ -13,7 +14,10 @@
 #include "config/file_operations.h"
 #include "config/global_defs.h"
 #include "base/plain_name.h"
+#include "config/temp_file_claim.h"
+#include "config/temp_file_sweep.h"
 #include "config/temp_names.h"
+#include "base/trace.h"
 
 namespace qm::order_files {
 
@@ -109,29 +113,45 @@ void CheckColumnFilesFree(const CGlobalDefs& defs, std::string_view name,
 BuildFiles::BuildFiles(const CGlobalDefs& defs, std::size_t columns) {
   constexpr const char* kMethod = "OpenOrder";
   const std::string folder = OrderFolder(defs);
-  std::string base;
   for (int attempt = 1;; ++attempt) {
-    base = folder + SLGetTempFileName(defs, true, kTempCallerOrderFiles);
-    platform::FileHandle file = platform::OpenFileAs(base + ".sri.tmp", platform::FileAccess::Write,
-                                                     platform::FileDisposition::CreateNew);
-    if (file.IsOpen()) break;
-    if (errno != EEXIST) {
-      throw CPiOrderException::Text(kOpenFailureText, kMethod, nullptr, base + ".sri.tmp");
+    const std::string base = folder + SLGetTempFileName(defs, true, kTempCallerOrderFiles);
+    std::vector<std::string> paths{base + ".sri.tmp", base + ".srt.tmp"};
+    for (std::size_t i = 0; i < columns; ++i) {
+      paths.push_back(base + "_" + std::to_string(i + 1) + ".tmp");
+    }
+    std::vector<TempFileClaim> claims;
+    int error = 0;
+    for (const std::string& path : paths) {
+      std::optional<TempFileClaim> claim = TempFileClaim::Create(path);
+      if (!claim) {
+        error = errno;
+        break;
+      }
+      claims.push_back(std::move(*claim));
+    }
+    if (claims.size() == paths.size()) {
+      sri_ = paths[0];
+      srt_ = paths[1];
+      columns_.assign(paths.begin() + 2, paths.end());
+      claims_ = std::move(claims);
+      return;
+    }
+    for (std::size_t i = 0; i < claims.size(); ++i) platform::UnlinkFile(paths[i]);
+    if (error != EEXIST) {
+      throw CPiOrderException::Text(kOpenFailureText, kMethod, nullptr, paths[claims.size()]);
     }
     if (attempt == kTempNameAttempts) {
       throw CPiOrderException::Text("No free temporary name in %s", kMethod, nullptr, folder);
     }
   }
-  sri_ = base + ".sri.tmp";
-  srt_ = base + ".srt.tmp";
-  for (std::size_t i = 0; i < columns; ++i)
-    columns_.push_back(base + "_" + std::to_string(i + 1) + ".tmp");
 }
 
 BuildFiles::~BuildFiles() {
-  if (moved_) return;
-  for (const std::string* path : {&sri_, &srt_}) platform::UnlinkFile(*path);
-  for (const std::string& path : columns_) platform::UnlinkFile(path);
+  if (!moved_) {
+    for (const std::string* path : {&sri_, &srt_}) platform::UnlinkFile(*path);
+    for (const std::string& path : columns_) platform::UnlinkFile(path);
+  }
+  claims_.clear();
 }
 
 void BuildFiles::MoveIntoPlace(const CGlobalDefs& defs, std::string_view name,
@@ -174,6 +194,81 @@ void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo&
     for (const OrderColumn& column : info.Columns)
       DropFile(ColumnFilePath(defs, name, column.Name));
   }
+}
+
+namespace {
+
+// True when stem ("A_B_C") is the column file of another order of type 2
+// whose header reads ("A_B" with column "C").
+bool OwnedByAnotherOrder(const CGlobalDefs& defs, std::string_view name, const std::string& stem) {
+  const std::string own = ToUpper(name);
+  for (auto cut = stem.find('_'); cut != std::string::npos; cut = stem.find('_', cut + 1)) {
+    const std::string other = stem.substr(0, cut);
+    const std::string column = stem.substr(cut + 1);
+    if (other.empty() || column.empty() || other == own) continue;
+    if (!platform::FileExists(PathsOf(defs, other).sri)) continue;
+    try {
+      const COrderInfo info = ReadInfoShared(defs, other);
+      if (info.OrderType != kTextOrder) continue;
+      for (const OrderColumn& c : info.Columns) {
+        if (ToUpper(c.Name) == column) return true;
+      }
+    } catch (const CException&) {
+      // An unreadable order owns nothing that can be told.
+    }
+  }
+  return false;
+}
+
+}  // namespace
+
+std::vector<std::string> ExistingFiles(const CGlobalDefs& defs, std::string_view name) {
+  const OrderPaths paths = PathsOf(defs, name);
+  std::vector<std::string> files;
+  std::optional<COrderInfo> info;
+  if (platform::FileExists(paths.sri)) {
+    files.push_back(paths.sri);
+    try {
+      BFile file;
+      file.OpenFile(paths.sri, BFile::kReadOnly, kBlockUnits);
+      info.emplace();
+      info->ReadInfo(file);
+    } catch (const CException&) {
+      info.reset();
+    }
+  }
+  if (platform::FileExists(paths.srt)) files.push_back(paths.srt);
+  if (info) {
+    if (info->OrderType == kTextOrder) {
+      for (const OrderColumn& column : info->Columns) {
+        const std::string path = ColumnFilePath(defs, name, column.Name);
+        if (platform::FileExists(path)) files.push_back(path);
+      }
+    }
+    return files;
+  }
+  // No header to name the columns: every NAME_*.col no other order claims.
+  const std::string prefix = ToUpper(name) + "_";
+  std::vector<std::string> names;
+  platform::ListFolder(OrderFolder(defs), names);
+  for (const std::string& file : names) {
+    if (file.size() <= prefix.size() + 4 || file.compare(0, prefix.size(), prefix) != 0 ||
+        file.compare(file.size() - 4, 4, ".col") != 0) {
+      continue;
+    }
+    const std::string stem = file.substr(0, file.size() - 4);
+    if (!OwnedByAnotherOrder(defs, name, stem)) files.push_back(OrderFolder(defs) + file);
+  }
+  return files;
+}
+
+std::vector<std::string> RemoveOrphanedTempFiles(const CGlobalDefs& defs) {
+  const std::vector<std::string> removed = SweepOrphanedTempFiles(OrderFolder(defs));
+  for (const std::string& path : removed) {
+    Trace(true, "PILIB.PiOrder.RemoveTempFiles", "Removed temporary file of a killed build: %s",
+          path);
+  }
+  return removed;
 }
 
 }  // namespace qm::order_files

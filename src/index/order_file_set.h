@@ -15,6 +15,7 @@
 #include <string_view>
 #include <vector>
 
+#include "config/temp_file_claim.h"
 #include "format/order_info.h"
 
 namespace qm {
@@ -50,8 +51,8 @@ void CheckColumnFilesFree(const CGlobalDefs& defs, std::string_view name,
 // The header of an existing order, read under a reader unit of its kind 3 lock.
 COrderInfo ReadInfoShared(const CGlobalDefs& defs, std::string_view name);
 
-// The files of one build under temporary names in the order folder. The name
-// is reserved by creating the .sri file exclusively; whatever has not been
+// The files of one build under temporary names in the order folder, each
+// created exclusively and locked for the object's life; whatever has not been
 // moved into place is removed when the object dies (a failed build leaves
 // nothing behind).
 class BuildFiles {
@@ -80,6 +81,8 @@ class BuildFiles {
   std::string sri_;
   std::string srt_;
   std::vector<std::string> columns_;
+  // One per file, held until the object dies: a sweep leaves them alone.
+  std::vector<TempFileClaim> claims_;
   bool moved_ = false;
 };
 
@@ -87,6 +90,15 @@ class BuildFiles {
 // reader from then on), NAME.srt, then the column files of a type 2 info.
 // REQUIRES: the caller holds the exclusive kind 3 lock of the order.
 void DropFiles(const CGlobalDefs& defs, std::string_view name, const COrderInfo& info);
+
+// The files of the order name that exist, whatever their state: NAME.sri,
+// NAME.srt and its column files. Without a readable header the column files
+// are the NAME_*.col files that no other order of type 2 owns.
+std::vector<std::string> ExistingFiles(const CGlobalDefs& defs, std::string_view name);
+
+// Removes the temporaries of the group's Orders folder that no running build
+// holds (files left by killed builds), tracing each; returns their paths.
+std::vector<std::string> RemoveOrphanedTempFiles(const CGlobalDefs& defs);
 
 }  // namespace order_files
 }  // namespace qm

@@ -26,6 +26,7 @@
 #include "format/mfile.h"
 #include "base/plain_name.h"
 #include "base/trace.h"
+#include "config/file_operations.h"
 
 namespace qm {
 
@@ -181,6 +182,7 @@ void CPiOrder::BuildOrder(COrderInfo& definition, bool rebuild, bool ranks_only,
   GuardSort(method, [&] {
     order_files::CheckNames(definition, method);
     CloseOrder();
+    order_files::RemoveOrphanedTempFiles(defs_);
     const std::string& name = definition.OrderName;
     CPiOrder existing(defs_);
     std::optional<COrderInfo> replaced;  // the stored order's header, when there is one
@@ -467,6 +469,34 @@ void CPiOrder::DropOrder() {
     CLockManager lock(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
     lock.LockExclusive();
     order_files::DropFiles(defs_, name, info);
+  });
+}
+
+std::vector<std::string> CPiOrder::DropOrderFiles(std::string_view name) {
+  constexpr const char* kMethod = "DropOrder";
+  return GuardOrder(kMethod, [&] {
+    RequirePlainName<CPiOrderException>("order", name, kMethod);
+    CloseOrder();
+    CLockManager lock(defs_.GetLockScope(), defs_.GetGroup(), name, kLockOrder);
+    lock.LockExclusive();
+    std::vector<std::string> removed = order_files::ExistingFiles(defs_, name);
+    if (removed.empty()) {
+      lock.UnlockAll();
+      // Nothing to drop: the same failure as any use of a missing order.
+      OpenOrder(name, kModeRead);
+      CloseOrder();
+      return removed;
+    }
+    // The header first: from then on the order is gone for every reader.
+    for (const std::string& path : removed) {
+      DropFile(path);
+      Trace(defs_.TraceLevel1(), "PILIB.PiOrder.DropOrder", "Dropped file %s", path);
+    }
+    lock.UnlockAll();
+    for (std::string& path : order_files::RemoveOrphanedTempFiles(defs_)) {
+      removed.push_back(std::move(path));
+    }
+    return removed;
   });
 }
 

@@ -70,6 +70,10 @@ class CPiOrder {
   // Deletes the files of the order opened in mode 3 (the column files of a
   // type 2 order too) under the exclusive kind 3 lock; the order is closed.
   void DropOrder();
+  // Deletes whatever files of the order name exist, also damaged ones that
+  // no longer open, under the exclusive kind 3 lock, tracing each; returns
+  // their paths. A name without any file raises what opening it raises.
+  std::vector<std::string> DropOrderFiles(std::string_view name);
 
  private:
   struct State;

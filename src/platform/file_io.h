@@ -8,6 +8,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace qm::platform {
 
@@ -107,5 +108,21 @@ int UnlinkFile(const std::string& path);
 int MakeDirectories(const std::string& path);
 
 bool IsDirectory(const std::string& path);
+
+// The names of the entries of a folder ("." and ".." left out), sorted; 0 or
+// the errno of a folder that cannot be read.
+int ListFolder(const std::string& folder, std::vector<std::string>& names);
+
+// Size of the file at path, or -1 when it cannot be looked at.
+int64_t PathFileSize(const std::string& path);
+
+// A write lock on the whole file through the open file description of fd
+// (F_OFD_SETLK), never waiting: 0, EAGAIN while another description holds a
+// lock on it, or another errno. The kernel drops it when the description
+// closes, also when the process dies. fd must be open for writing.
+int TryLockWholeFile(int fd);
+
+// True when path names the file open as fd (same device and inode).
+bool IsSameFile(int fd, const std::string& path);
 
 }  // namespace qm::platform

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "index/findex_check.h"
 #include "index/findex_files_writer.h"
 #include "support/findex_decoder.h"
 #include "platform/text_encoding.h"
@@ -50,6 +51,8 @@ class FindexFilesTest : public ::testing::Test {
     return WriteFindexFiles(header_, sorted, Sdx(), Fst(), limits, std::move(observer));
   }
   DecodedFindex Decode(int32_t flags, int32_t type = 2) const {
+    // Every findex written whole passes the check that operators run.
+    EXPECT_EQ(CheckFindexPair(Sdx(), Fst()), std::vector<std::string>{});
     return test::DecodeFindex(Sdx(), Fst(), type, flags);
   }
   std::string Sdx() const { return dir_.Path() + "t.sdx"; }

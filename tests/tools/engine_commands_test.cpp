@@ -5,6 +5,8 @@
 #include <stdlib.h>
 
 #include <algorithm>
+#include <regex>
+#include <sstream>
 #include <filesystem>
 #include <string>
 #include <vector>
@@ -114,10 +116,10 @@ TEST_F(EngineCommandsTest, ExecBuildsUpdatesAndDropsAFindexThatInfoAndExistsSee)
   ASSERT_EQ(Host({"init"}).status, 0);  // the language data the build needs
   const std::string connect = Books({"create table books (id integer, title varchar(50))",
                                      "insert into books values (1, 'River fish'), (2, 'Mountain')"});
-  Result r = Host({"--connect", connect, "exec", "--background",
+  Result r = Host({"--connect", connect, "exec", "--background", "--quiet",
                    "CREATE FINDEX Books ON TABLE books COLUMNS title KEY id"});
   ASSERT_EQ(r.status, 0) << r.err;
-  EXPECT_EQ(r.out.substr(r.out.size() - 5), "100%\n") << r.out;
+  EXPECT_EQ(r.out, "");
 
   r = Host({"info", "findex", "Books"});
   ASSERT_EQ(r.status, 0) << r.err;
@@ -127,13 +129,16 @@ TEST_F(EngineCommandsTest, ExecBuildsUpdatesAndDropsAFindexThatInfoAndExistsSee)
   }
   EXPECT_EQ(std::count(r.out.begin(), r.out.end(), '\n'), 18);
   EXPECT_EQ(Host({"exists", "books"}).out, "yes\n");
+  EXPECT_EQ(Host({"exists", "books"}).status, 0);
 
   // An update runs through exec like any statement.
   Books({"insert into books values (3, 'Quiet lake')"});
   ASSERT_EQ(Host({"--connect", connect, "exec", "UPDATE", "FINDEX", "Books"}).status, 0);
   EXPECT_NE(Host({"info", "findex", "Books"}).out.find("idxKeyCount\t3\n"), std::string::npos);
   EXPECT_EQ(Host({"drop", "findex", "Books"}).status, 0);
-  EXPECT_EQ(Host({"exists", "Books"}).out, "no\n");
+  r = Host({"exists", "Books"});
+  EXPECT_EQ(r.out, "no\n");
+  EXPECT_EQ(r.status, 3);  // so that scripts can test it
 }
 
 TEST_F(EngineCommandsTest, ExecCountsTheTextValuesCutAtTheLimit) {
@@ -157,13 +162,205 @@ TEST_F(EngineCommandsTest, ExecCountsTheTextValuesCutAtTheLimit) {
 
 TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {
   // Standard output is not a terminal here: one line per percentage shown.
-  Result r = Host({"exec", "--background", "UPDATE FINDEX Books"});
+  const std::string connect = Books({"create table books (id integer, title varchar(50))"});
+  Result r = Host({"--connect", connect, "exec", "--background",
+                   "CREATE FINDEX Books ON TABLE nosuch COLUMNS title KEY id"});
   EXPECT_EQ(r.status, 1);
   ASSERT_GE(r.out.size(), 5u) << r.out;
   EXPECT_EQ(r.out.substr(r.out.size() - 5), "100%\n") << r.out;
   EXPECT_EQ(r.out.find('\r'), std::string::npos);
   EXPECT_EQ(r.err.rfind("quillmere exec: ", 0), 0u) << r.err;
 
+}
+
+
+TEST_F(EngineCommandsTest, AFindexOrOrderThatIsNotThereIsNamedNotItsFile) {
+  const fs::path empty = dir_.Path() + "never-initialised";
+  fs::create_directories(empty);
+  struct Case {
+    std::vector<std::string> args;
+    std::string err;
+  };
+  for (const Case& c : std::vector<Case>{
+           {{"info", "findex", "NOPE"}, "quillmere info: no findex NOPE in group PUBLIC\n"},
+           {{"drop", "order", "NOPE"}, "quillmere drop: no order NOPE in group PUBLIC\n"},
+           {{"options", "get", "index-general", "--stored", "NOPE"},
+            "quillmere options: no findex NOPE in group PUBLIC\n"},
+           {{"check", "order", "NOPE"}, "quillmere check: no order NOPE in group PUBLIC\n"},
+           {{"exec", "UPDATE FINDEX NOPE"}, "quillmere exec: no findex NOPE in group PUBLIC\n"},
+           {{"exec", "DELETE FROM FINDEX NOPE 3"}, "quillmere exec: no findex NOPE in group PUBLIC\n"},
+           {{"--group", "Other", "info", "findex", "NOPE"},
+            "quillmere info: no findex NOPE in group Other\n"},
+           {{"--data", empty.string(), "info", "findex", "NOPE"},
+            "quillmere info: no findex NOPE in group PUBLIC\n"},
+       }) {
+    const Result r = Host(c.args);
+    EXPECT_EQ(r.status, 1) << c.args[1];
+    EXPECT_EQ(r.err, c.err);
+  }
+}
+
+TEST_F(EngineCommandsTest, OptionValuesNoBuildCanUseAreRefusedAndNothingIsSaved) {
+  const std::string long_text(40000, ';');
+  struct Case {
+    std::string kind, setting, err;
+  };
+  for (const Case& c : std::vector<Case>{
+           {"index-language", "iloLanguage=99", "iloLanguage takes a language from 1 to 12"},
+           {"index-language", "iloLanguage=0", "iloLanguage takes a language from 1 to 12"},
+           {"index-general", "igoIndexMaxSize=-5", "igoIndexMaxSize takes 0 (no limit)"},
+           {"index-general", "igoSeparators=" + long_text,
+            "igoSeparators is too long (40000 characters) for the findex header"},
+           {"order-general", "ogoIgnoreChars=" + long_text.substr(0, 3000),
+            "ogoIgnoreChars is too long (3000 characters) for the order header"},
+       }) {
+    const Result right = Host({"options", "set", c.kind, c.setting});
+    EXPECT_EQ(right.status, 2) << c.setting.substr(0, 20);
+    EXPECT_NE(right.err.find(c.err), std::string::npos) << right.err;
+    EXPECT_EQ(right.out, "");
+  }
+  EXPECT_TRUE(fs::is_empty(dir_.Path() + "data/Groups/PUBLIC/Config"));
+  // The edges that builds do use are taken.
+  EXPECT_EQ(Host({"options", "set", "index-language", "iloLanguage=12"}).status, 0);
+  EXPECT_EQ(Host({"options", "set", "index-general", "igoIndexMaxSize=0"}).status, 0);
+}
+
+TEST_F(EngineCommandsTest, VersionAndTranslateHelp) {
+  Result r = Host({"--version"});
+  EXPECT_EQ(r.status, 0);
+  EXPECT_EQ(r.out, "quillmere 6.14\nfindex format 614\n");
+  r = Host({"translate", "--help"});
+  EXPECT_EQ(r.status, 0) << r.err;
+  EXPECT_EQ(r.out.rfind("usage: quillmere translate STATEMENT\n", 0), 0u) << r.out;
+}
+
+TEST_F(EngineCommandsTest, ListCheckRepairAndTheExecSummaryOnBuiltFindexesAndOrders) {
+  ASSERT_EQ(Host({"init"}).status, 0);
+  const std::string connect =
+      Books({"create table books (id integer, title varchar(50), year integer)",
+             "insert into books values (1, 'River fish', 1990), (2, 'Mountain', 1985)"});
+  Result r = Host({"--connect", connect, "exec",
+                   "CREATE FINDEX Books ON TABLE books COLUMNS title KEY id"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_TRUE(std::regex_match(
+      r.out, std::regex("exec: [0-9]+\\.[0-9][0-9] s, 2 rows read, 3 words written, 2 keys in "
+                        "findex BOOKS\n")))
+      << r.out;
+  r = Host({"--connect", connect, "exec", "CREATE ORDER Titles ON TABLE books COLUMNS title,year KEY id"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_TRUE(std::regex_match(r.out, std::regex("exec: [0-9.]+ s, 2 keys in order TITLES\n")))
+      << r.out;
+  // An update of a findex this small rebuilds it whole, from every row.
+  r = Host({"--connect", connect, "exec", "UPDATE FINDEX Books"});
+  EXPECT_NE(r.out.find(", 2 rows read, 3 words written, 2 keys in findex BOOKS\n"),
+            std::string::npos)
+      << r.out;
+
+  // Piped, list is tab-separated under a line of column names.
+  r = Host({"list"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  std::vector<std::string> lines;
+  for (std::size_t at = 0, end; (end = r.out.find('\n', at)) != std::string::npos; at = end + 1) {
+    lines.push_back(r.out.substr(at, end - at));
+  }
+  ASSERT_EQ(lines.size(), 3u) << r.out;
+  EXPECT_EQ(lines[0], "NAME\tKIND\tTYPE\tKEYS\tWORDS\tADD-ONS\tDELETED\tBYTES\tBUILT\tUPDATED");
+  EXPECT_EQ(lines[1].rfind("BOOKS\tfindex\tText (Ansi)\t2\t3\t0\t0\t", 0), 0u) << lines[1];
+  EXPECT_EQ(lines[2].rfind("TITLES\torder\tText\t2\t-\t-\t-\t", 0), 0u) << lines[2];
+  EXPECT_EQ(std::count(lines[1].begin(), lines[1].end(), '\t'), 9);
+
+  for (const char* kind : {"findex", "order"}) {
+    r = Host({"check", kind, kind == std::string("findex") ? "Books" : "titles"});
+    EXPECT_EQ(r.status, 0) << r.out << r.err;
+    EXPECT_NE(r.out.find(" is sound\n"), std::string::npos) << r.out;
+  }
+
+  // Damage is reported with its place, exit 3; --repair removes what a killed
+  // build left and tells how to rebuild.
+  const std::string indexes = dir_.Path() + "data/Groups/PUBLIC/Indexes/";
+  fs::resize_file(indexes + "BOOKS.fst", 10);
+  test::WriteFile(indexes + "tmpxxxx_5_99.tmp1", "left by a killed build");
+  r = Host({"check", "findex", "Books", "--repair"});
+  EXPECT_EQ(r.status, 3) << r.err;
+  EXPECT_NE(r.out.find("removed " + indexes + "tmpxxxx_5_99.tmp1\n"), std::string::npos) << r.out;
+  EXPECT_NE(r.out.find("BOOKS.fst list of BOOKS.sdx block "), std::string::npos) << r.out;
+  EXPECT_NE(r.out.find("findex BOOKS is damaged: "), std::string::npos) << r.out;
+  EXPECT_NE(r.out.find("quillmere exec \"UPDATE FINDEX BOOKS REBUILD\""), std::string::npos);
+  EXPECT_FALSE(fs::exists(indexes + "tmpxxxx_5_99.tmp1"));
+
+  r = Host({"exec", "UPDATE FINDEX Books REBUILD"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_EQ(Host({"check", "findex", "Books"}).status, 0);
+  r = Host({"drop", "findex", "Books"});
+  EXPECT_EQ(r.status, 0) << r.err;
+  EXPECT_EQ(r.out, "removed " + indexes + "BOOKS.fst\nremoved " + indexes + "BOOKS.sdx\n");
+}
+
+TEST_F(EngineCommandsTest, ListAndTheSummaryCountAddOnsAndDeletedKeysAndListShowsDamage) {
+  ASSERT_EQ(Host({"init"}).status, 0);
+  // 700 rows of three words: 2,100 words, enough for updates to go to add-ons.
+  std::string rows;
+  for (int id = 1; id <= 700; ++id) {
+    const std::string w = "w" + std::to_string(id);
+    rows += (rows.empty() ? "(" : ",(") + std::to_string(id) + ", '" + w + "a " + w + "b " + w +
+            "c')";
+  }
+  const std::string connect =
+      Books({"create table books (id integer, title varchar(50))", "insert into books values " + rows});
+  ASSERT_EQ(Host({"--connect", connect, "exec", "CREATE FINDEX Big ON TABLE books COLUMNS title KEY id"})
+                .status,
+            0);
+  Books({"insert into books values (701, 'late one'), (702, 'late two')"});
+  Result r = Host({"--connect", connect, "exec", "UPDATE FINDEX Big"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  // The summary counts what this build wrote (the add-on) and what the findex holds.
+  EXPECT_NE(r.out.find(", 2 rows read, 4 words written, 702 keys in findex BIG\n"),
+            std::string::npos)
+      << r.out;
+  ASSERT_EQ(Host({"exec", "DELETE FROM FINDEX Big 5"}).status, 0);
+  ASSERT_EQ(Host({"exec", "DELETE FROM FINDEX Big 7"}).status, 0);
+  test::WriteFile(dir_.Path() + "data/Groups/PUBLIC/Indexes/BROKEN.sdx", "not a findex");
+
+  r = Host({"list"});
+  ASSERT_EQ(r.status, 0) << r.err;
+  EXPECT_NE(r.out.find("\nBIG\tfindex\tText (Ansi)\t702\t2104\t1\t2\t"), std::string::npos)
+      << r.out;
+  EXPECT_NE(r.out.find("\nBROKEN\tfindex\tdamaged\tdamaged\tdamaged\tdamaged\t0\t12\t"),
+            std::string::npos)
+      << r.out;
+}
+
+// The README's order example, run as written there.
+TEST_F(EngineCommandsTest, TheReadmeOrderExampleRuns) {
+  ASSERT_EQ(Host({"init"}).status, 0);
+  const std::string connect =
+      Books({"create table books (id integer, title varchar(50), year integer)",
+             "insert into books values (1, 'River fish', 1990), (2, 'Mountain', 1985)"});
+  const std::string readme = test::ReadFile(std::string(QM_TEST_SOURCE_DIR) + "../README.md");
+  const auto section = readme.find("### Orders");
+  ASSERT_NE(section, std::string::npos);
+  const std::string block = readme.substr(section, readme.find("\n## ", section) - section);
+  int run = 0;
+  std::istringstream lines(block);
+  for (std::string line; std::getline(lines, line);) {
+    const std::string prefix = "    quillmere --data D ";
+    if (line.rfind(prefix, 0) != 0) continue;
+    line = line.substr(prefix.size(), line.find("  #") - prefix.size());
+    // Split like a shell: double-quoted words stay whole; "..." is the connection.
+    std::vector<std::string> args;
+    for (std::size_t at = 0; at < line.size();) {
+      if (line[at] == ' ') { ++at; continue; }
+      const bool quoted = line[at] == '"';
+      const std::size_t end = quoted ? line.find('"', at + 1) : line.find(' ', at);
+      std::string word = quoted ? line.substr(at + 1, end - at - 1) : line.substr(at, end - at);
+      args.push_back(word == "..." ? connect : word);
+      at = end == std::string::npos ? line.size() : end + 1;
+    }
+    const Result r = Host(args);
+    EXPECT_EQ(r.status, 0) << line << "\n" << r.err;
+    ++run;
+  }
+  EXPECT_EQ(run, 5);
 }
 
 }  // namespace

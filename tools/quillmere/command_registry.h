@@ -18,10 +18,12 @@ struct GlobalOptions {
   std::string password;  // --password P
 };
 
-// Exit statuses: 0 success, 1 an engine error, 2 a usage error.
+// Exit statuses: 0 success, 1 an engine error, 2 a usage error, 3 a "no"
+// for scripts (exists: no such findex; check: damage found).
 inline constexpr int kExitOk = 0;
 inline constexpr int kExitError = 1;
 inline constexpr int kExitUsage = 2;
+inline constexpr int kExitNo = 3;
 
 // "--help" or "-h".
 inline bool IsHelpFlag(std::string_view arg) { return arg == "--help" || arg == "-h"; }

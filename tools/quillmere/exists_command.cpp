@@ -17,7 +17,8 @@ int RunExists(const GlobalOptions& global, const std::vector<std::string>& args)
     std::printf(
         "usage: quillmere [GLOBAL OPTIONS] %s\n\n"
         "Prints \"yes\" when the findex NAME opens in the group (--group, default PUBLIC),\n"
-        "\"no\" otherwise.\n",
+        "\"no\" otherwise.\n\n"
+        "Exit status: 0 yes, 3 no, 1 engine error, 2 usage error.\n",
         kUsage);
     return kExitOk;
   }
@@ -29,7 +30,7 @@ int RunExists(const GlobalOptions& global, const std::vector<std::string>& args)
     return session.Fail();
   }
   std::puts(exists == VARIANT_TRUE ? "yes" : "no");
-  return kExitOk;
+  return exists == VARIANT_TRUE ? kExitOk : kExitNo;
 }
 
 const CommandRegistration kExists{

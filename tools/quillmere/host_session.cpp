@@ -3,6 +3,9 @@
 #include <cstdio>
 #include <utility>
 
+#include "index/findex_file_set.h"
+#include "index/order_file_set.h"
+#include "platform/file_io.h"
 #include "platform/text_encoding.h"
 #include "terminal_text.h"
 
@@ -59,7 +62,50 @@ bool HostSession::Open(const GlobalOptions& options) {
   if (command_->LoadDefaultIndexOptions() != S_OK || command_->LoadDefaultOrderOptions() != S_OK) {
     return Fail(), false;
   }
+  group_ = options.group.empty() ? "PUBLIC" : options.group;
+  try {
+    if (!options.data_dir.empty()) defs_.SetDataPath(options.data_dir);
+    defs_.SetGroup(group_);
+  } catch (const CExceptionBase& e) {
+    return Fail(TerminalText(e)), false;
+  }
   return true;
+}
+
+std::string HostSession::Group() const { return group_; }
+
+bool HostSession::Require(bool there, std::string_view what, std::string_view name) {
+  if (there) return true;
+  Fail("no " + std::string(what) + " " + std::string(name) + " in group " + group_);
+  return false;
+}
+
+namespace {
+
+// False also when the folders cannot be resolved or read: a data directory
+// that was never initialised, or one this user cannot read.
+template <class Look>
+bool Looks(Look&& look) {
+  try {
+    return look();
+  } catch (const CExceptionBase&) {
+    return false;
+  }
+}
+
+}  // namespace
+
+bool HostSession::RequireFindex(std::string_view name) {
+  return Require(Looks([&] { return !findex::ExistingFiles(defs_, name).empty(); }), "findex",
+                 name);
+}
+
+bool HostSession::RequireOrder(std::string_view name) {
+  return Require(Looks([&] {
+                   const order_files::OrderPaths paths = order_files::PathsOf(defs_, name);
+                   return platform::FileExists(paths.sri) || platform::FileExists(paths.srt);
+                 }),
+                 "order", name);
 }
 
 int HostSession::Fail() {

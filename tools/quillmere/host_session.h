@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "command_registry.h"
+#include "config/global_defs.h"
 #include "quillmere/api_command.h"
 
 namespace qm::cli {
@@ -26,6 +27,18 @@ class HostSession {
   // A text argument that stays valid for the session.
   const BSTR* Text(std::string_view utf8);
 
+  // The settings of the invocation (data path, group) for the host's own
+  // look at the files; valid after Open.
+  CGlobalDefs& Defs() { return defs_; }
+  // The group in force, as messages name it.
+  std::string Group() const;
+
+  // Whether any file of the findex (order) is in the group. When none is,
+  // prints "no findex NAME in group GROUP" and returns false: the engine's
+  // message would name a file where the user named an object.
+  bool RequireFindex(std::string_view name);
+  bool RequireOrder(std::string_view name);
+
   // Prints the calling thread's error information to standard error and
   // returns kExitError.
   int Fail();
@@ -35,7 +48,11 @@ class HostSession {
   int Usage(std::string_view message, std::string_view usage);
 
  private:
+  bool Require(bool there, std::string_view what, std::string_view name);
+
   std::string name_;
+  std::string group_;
+  CGlobalDefs defs_;
   std::unique_ptr<APICommand> command_;
   std::deque<BSTR> texts_;
 };

@@ -72,6 +72,7 @@ int RunInfo(const GlobalOptions& global, const std::vector<std::string>& args) {
   }
   const bool order = args[0] == "order";
   if (!session.Open(global)) return kExitError;
+  if (!(order ? session.RequireOrder(args[1]) : session.RequireFindex(args[1]))) return kExitError;
   APICommand& command = session.Command();
   if (command.SetCurrentObjectName(session.Text(args[1])) != S_OK) return session.Fail();
   using Values = std::span<const std::pair<const char*, int32_t>>;

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "command_registry.h"
+#include "config/global_defs.h"
 
 namespace qm::cli {
 
@@ -17,7 +18,8 @@ namespace {
 
 void PrintHelp(std::FILE* out) {
   std::fputs(
-      "usage: quillmere [--data DIR] [--group NAME]\n"
+      "usage: quillmere --version\n"
+      "       quillmere [--data DIR] [--group NAME]\n"
       "                 [--connect \"CONNECTION STRING\" | --dsn DSN [--user U] [--password P]]\n"
       "                 COMMAND [ARGS]\n\ncommands:\n",
       out);
@@ -55,6 +57,11 @@ int main(int argc, char** argv) {
                                               : nullptr;
     if (IsHelpFlag(a)) {
       PrintHelp(stdout);
+      return kExitOk;
+    }
+    if (a == "--version") {
+      std::printf("quillmere %s\nfindex format %d\n", qm::CGlobalDefs::kVersionText,
+                  qm::CGlobalDefs::kVersion);
       return kExitOk;
     }
     if (target == nullptr) break;

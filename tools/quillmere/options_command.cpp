@@ -8,6 +8,8 @@
 #include <vector>
 
 #include "command_registry.h"
+#include "format/index_header.h"
+#include "format/order_info.h"
 #include "host_session.h"
 #include "platform/text_encoding.h"
 
@@ -149,7 +151,10 @@ void PrintHelp() {
       "NAME is an enum name as printed (igoSupportScore); a bit takes 1 or 0, a number\n"
       "a decimal integer, igoSeparators and ogoIgnoreChars a text in which <SPACE>,\n"
       "<NEW_LINE>, <LINE_FEED> and <TAB> stand for those characters in igoSeparators.\n"
-      "igoUseUnicode is reported only and cannot be set.\n",
+      "igoUseUnicode is reported only and cannot be set.\n\n"
+      "Values no build can use are refused and nothing is changed (exit status 2):\n"
+      "iloLanguage outside 1 to 12, a negative igoIndexMaxSize, and an igoSeparators\n"
+      "or ogoIgnoreChars too long for the header block of a findex or an order.\n",
       kUsage);
 }
 
@@ -182,7 +187,43 @@ void Print(const OptionSet& set, const Values& values) {
   std::fputs(out.c_str(), stdout);
 }
 
-std::optional<std::string> CheckValue(const Option& option, const std::string& text) {
+// Values that parse but that no build can use: saved, they would fail every
+// later build of the group, or index other than asked.
+std::optional<std::string> CheckRange(const OptionSet& set, const Option& option,
+                                      const std::string& text) {
+  const std::string kind = set.kind;
+  if (kind == "index-language" && option.value == iloLanguage) {
+    const int32_t n = std::stoi(text);
+    if (n < lngDanish || n > lngOther) {
+      return std::string("takes a language from 1 to 12 (1 Danish, 2 English, ... 12 Other)");
+    }
+  }
+  if (kind == "index-general" && option.value == igoIndexMaxSize && std::stoi(text) < 0) {
+    return std::string("takes 0 (no limit) or a positive number of 100,000-key units");
+  }
+  // Both texts are stored in the header block of every findex or order built.
+  if (kind == "index-general" && option.value == igoSeparators) {
+    CIndexHeader probe;
+    probe.Separators = Utf8ToUtf16(DecodeBlanks(text));
+    if (!probe.FitsHeaderBlock()) {
+      return "is too long (" + std::to_string(probe.Separators.size()) +
+             " characters) for the findex header, which holds the whole definition in 4,096 "
+             "bytes";
+    }
+  }
+  if (kind == "order-general" && option.value == ogoIgnoreChars) {
+    COrderInfo probe;
+    probe.IgnoreChars = Utf8ToUtf16(text);
+    if (!probe.FitsHeaderBlock()) {
+      return "is too long (" + std::to_string(probe.IgnoreChars.size()) +
+             " characters) for the order header, which holds the whole definition in 4,096 bytes";
+    }
+  }
+  return std::nullopt;
+}
+
+std::optional<std::string> CheckValue(const OptionSet& set, const Option& option,
+                                      const std::string& text) {
   switch (option.kind) {
     case ValueKind::Bit:
       if (text != "0" && text != "1") return std::string("takes 1 or 0");
@@ -193,9 +234,9 @@ std::optional<std::string> CheckValue(const Option& option, const std::string& t
       if (error != std::errc() || end != text.data() + text.size()) {
         return std::string("takes a decimal integer");
       }
-      return std::nullopt;
+      return CheckRange(set, option, text);
     }
-    case ValueKind::Text: return std::nullopt;
+    case ValueKind::Text: return CheckRange(set, option, text);
   }
   return std::nullopt;
 }
@@ -220,6 +261,9 @@ int RunOptions(const GlobalOptions& global, const std::vector<std::string>& args
       return session.Usage("options get takes only --stored NAME", kUsage);
     }
     if (!session.Open(global)) return kExitError;
+    if (stored && !(set->index ? session.RequireFindex(*stored) : session.RequireOrder(*stored))) {
+      return kExitError;
+    }
     if (stored && session.Command().SetCurrentObjectName(session.Text(*stored)) != S_OK) {
       return session.Fail();
     }
@@ -245,7 +289,7 @@ int RunOptions(const GlobalOptions& global, const std::vector<std::string>& args
       return session.Usage("igoUseUnicode is reported only and cannot be set", kUsage);
     }
     const std::string value = args[i].substr(eq + 1);
-    if (const auto problem = CheckValue(*found, value)) {
+    if (const auto problem = CheckValue(*set, *found, value)) {
       return session.Usage(name + " " + *problem, kUsage);
     }
     changes[found->value] = value;

@@ -88,6 +88,17 @@ void PrintRecord(const PiCmd& cmd, const CIndexHeader& findex, const COrderInfo&
 }
 
 int RunTranslate(const GlobalOptions&, const std::vector<std::string>& args) {
+  if (args.size() == 1 && IsHelpFlag(args[0])) {
+    std::printf(
+        "usage: quillmere translate STATEMENT\n\n"
+        "Translates one command statement, as the engine does before it runs one, and\n"
+        "prints its command record: command type, names, columns with their tags, key,\n"
+        "options and the command lock. Nothing is run and no data directory is used;\n"
+        "passwords are masked. Several arguments are joined with blanks.\n\n"
+        "Exit status: 0 translated, 1 the statement is refused (message on standard\n"
+        "error), 2 usage error.\n");
+    return kExitOk;
+  }
   if (args.empty()) {
     std::fputs("usage: quillmere translate STATEMENT\n", stderr);
     return kExitUsage;

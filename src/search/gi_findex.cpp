@@ -1,6 +1,7 @@
 #include "search/gi_findex.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "base/byte_layout.h"
 #include "base/exception_family.h"
@@ -456,14 +457,17 @@ CLookupResult CGiFIndex::GetItems(CItems& items, const CWordSearch& word, int32_
   });
 }
 
-CLookupResult CGiFIndex::ScanPattern(CItems& items, const CWordSearch& word, int64_t limit) {
+// Walks the leaves from leaf on and reads each run of consecutive matching
+// words with one read, from the first match to the first word after the run;
+// a run still open at the end is read to the end of the .fst. match(row) says
+// whether a word matches and whether the walk goes on after it.
+template <class Match>
+CLookupResult CGiFIndex::ReadMatchingRuns(CItems& items, int32_t leaf, int64_t limit,
+                                          Match match) {
   CLookupResult result;
-  const bool narrow = header_.FindexType == static_cast<int32_t>(VALUE_TYPE::AsciiString);
-  const int32_t leaf = Descend(word.low);
   if (leaf == 0) return result;
   bool open = false;
   int64_t run_start = 0;
-  std::u16string wide;
   auto read_run = [&](int64_t stop) {
     int32_t runs = 0;
     result.rows += ReadRange(items, run_start, stop, limit, result.truncated, runs);
@@ -471,14 +475,8 @@ CLookupResult CGiFIndex::ScanPattern(CItems& items, const CWordSearch& word, int
     open = false;
   };
   WalkLeaves(leaf, [&](const LeafRow& row) {
-    CWordPattern::Outcome outcome;
-    if (narrow) {
-      outcome = word.pattern.MatchUtf8(row.value.narrow);
-    } else {
-      wide = row.value.WideText();
-      outcome = word.pattern.Match(wide);
-    }
-    if (outcome == CWordPattern::kMatch) {
+    const auto [matched, go_on] = match(row);
+    if (matched) {
       result.found = true;
       if (!open) {
         open = true;
@@ -487,15 +485,29 @@ CLookupResult CGiFIndex::ScanPattern(CItems& items, const CWordSearch& word, int
       return true;
     }
     if (open) read_run(row.position);
-    return outcome != CWordPattern::kPastPrefix && !result.truncated;
+    return go_on && !result.truncated;
   });
   if (open && !result.truncated) read_run(fst_size_);
   return result;
 }
 
+CLookupResult CGiFIndex::ScanPattern(CItems& items, const CWordSearch& word, int64_t limit) {
+  const bool narrow = header_.FindexType == static_cast<int32_t>(VALUE_TYPE::AsciiString);
+  std::u16string wide;
+  return ReadMatchingRuns(items, Descend(word.low), limit, [&](const LeafRow& row) {
+    CWordPattern::Outcome outcome;
+    if (narrow) {
+      outcome = word.pattern.MatchUtf8(row.value.narrow);
+    } else {
+      wide = row.value.WideText();
+      outcome = word.pattern.Match(wide);
+    }
+    return std::pair{outcome == CWordPattern::kMatch, outcome != CWordPattern::kPastPrefix};
+  });
+}
+
 CLookupResult CGiFIndex::ScanSimilar(CItems& items, const CWordSearch& word, int32_t flags,
                                      int32_t modifier, int64_t limit) {
-  CLookupResult result;
   const bool narrow = header_.FindexType == static_cast<int32_t>(VALUE_TYPE::AsciiString);
   const std::u32string sought = CodePoints(word.word);
   int64_t allowed = 0;
@@ -508,33 +520,11 @@ CLookupResult CGiFIndex::ScanSimilar(CItems& items, const CWordSearch& word, int
   const auto bound = static_cast<int32_t>(std::min<int64_t>(allowed, 1 << 20));
   // Similar words can sort anywhere: every leaf is read, from the first.
   CValue lowest(static_cast<VALUE_TYPE>(header_.FindexType));
-  const int32_t leaf = Descend(lowest);
-  if (leaf == 0) return result;
-  bool open = false;
-  int64_t run_start = 0;
   std::u32string candidate;
-  auto read_run = [&](int64_t stop) {
-    int32_t runs = 0;
-    result.rows += ReadRange(items, run_start, stop, limit, result.truncated, runs);
-    result.runs += runs;
-    open = false;
-  };
-  WalkLeaves(leaf, [&](const LeafRow& row) {
+  return ReadMatchingRuns(items, Descend(lowest), limit, [&](const LeafRow& row) {
     candidate = narrow ? CodePointsUtf8(row.value.narrow) : CodePoints(row.value.WideText());
-    const bool match = BoundedEditDistance(sought, candidate, bound) <= bound;
-    if (match) {
-      result.found = true;
-      if (!open) {
-        open = true;
-        run_start = row.position;
-      }
-      return true;
-    }
-    if (open) read_run(row.position);
-    return !result.truncated;
+    return std::pair{BoundedEditDistance(sought, candidate, bound) <= bound, true};
   });
-  if (open && !result.truncated) read_run(fst_size_);
-  return result;
 }
 
 void CGiFIndex::GetFindexWordsW(const CWordPattern& filter, int32_t first, int32_t last,

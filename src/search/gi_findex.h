@@ -144,6 +144,8 @@ class CGiFIndex {
   // Walks the leaf chain from block, calling visit for every row until it
   // returns false.
   void WalkLeaves(int32_t block, const std::function<bool(const LeafRow&)>& visit);
+  template <class Match>
+  CLookupResult ReadMatchingRuns(CItems& items, int32_t leaf, int64_t limit, Match match);
   CLookupResult ScanPattern(CItems& items, const CWordSearch& word, int64_t limit);
   CLookupResult ScanSimilar(CItems& items, const CWordSearch& word, int32_t flags,
                             int32_t modifier, int64_t limit);

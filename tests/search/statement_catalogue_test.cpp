@@ -47,6 +47,7 @@ TEST_F(StatementCatalogueTest, ValuesFollowTheFindexTheyName) {
                                               VARIANT_FALSE, VARIANT_FALSE),
             S_OK);
   Build("Stopped", "varchar(100)", "'the river of life'");
+  Build("Counted", "integer", "1999");
   ASSERT_EQ(command_->SetIndexLanguageOptions(2, VARIANT_FALSE, VARIANT_FALSE, VARIANT_FALSE,
                                               VARIANT_FALSE, VARIANT_FALSE),
             S_OK);
@@ -65,8 +66,8 @@ TEST_F(StatementCatalogueTest, ValuesFollowTheFindexTheyName) {
   const Case cases[] = {
       {"STOPPED='the river of life'", "STOPPED{ADJ(RIVER,LIFE)}"},
       // Operators between values are no stop words, though "or" and "and" are.
-      {"STOPPED='the river' OR 'life'", "STOPPED{OR(RIVER,LIFE)}"},
-      {"STOPPED='river' AND 'life'", "STOPPED{AND(RIVER,LIFE)}"},
+      {"COUNTED='1999' OR '2001'", "COUNTED{OR(1999,2001)}"},
+      {"COUNTED='1999' AND '2001'", "COUNTED{AND(1999,2001)}"},
       {"KEPT='the river'", "KEPT{ADJ(THE,RIVER)}"},
       {"KEPT='red-wine'", "KEPT{ADJ(RED,WINE)}"},
       {"SPACED='red-wine'", "SPACED{RED-WINE}"},

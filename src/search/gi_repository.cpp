@@ -42,7 +42,7 @@ std::vector<std::string> CGiRepository::ResolveNames(const CGlobalDefs& defs,
     std::vector<std::string> names;
     const std::size_t dot = name.find('.');
     if (dot == std::string_view::npos) {
-      ShareRepository repositories(defs);
+      CShareRepository repositories(defs);
       if (!repositories.Exists(name)) {
         names.emplace_back(name);
         return names;
@@ -52,7 +52,7 @@ std::vector<std::string> CGiRepository::ResolveNames(const CGlobalDefs& defs,
         throw CGiRepositoryException::Text("Repository %s has no members: there is no findex to search",
                                            "OpenRepository", nullptr, std::string(name));
       }
-      ShareCollector collectors(defs);
+      CShareCollector collectors(defs);
       for (const auto& [collector, value] : record.Members) {
         const CCollectorRecord member = collectors.Read(name, collector);
         names.push_back(MemberFindexName(name, std::to_string(member.CollectorNumber)));
@@ -63,7 +63,7 @@ std::vector<std::string> CGiRepository::ResolveNames(const CGlobalDefs& defs,
     const std::string_view collector = name.substr(dot + 1);
     RequirePlainName<CGiRepositoryException>("repository", repository, "OpenRepository");
     RequirePlainName<CGiRepositoryException>("collector", collector, "OpenRepository");
-    ShareCollector collectors(defs);
+    CShareCollector collectors(defs);
     if (collectors.Exists(repository, collector)) {
       const CCollectorRecord member = collectors.Read(repository, collector);
       names.push_back(MemberFindexName(repository, std::to_string(member.CollectorNumber)));

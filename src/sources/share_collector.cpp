@@ -18,17 +18,17 @@ void ReadTexts(CBlock& block, CCollectorRecord& record, int n) {
 
 }  // namespace
 
-std::string ShareCollector::PathOf(std::string_view repository, std::string_view collector) const {
+std::string CShareCollector::PathOf(std::string_view repository, std::string_view collector) const {
   return defs_.GetFullDataPath(FolderKind::Repositories) + ToUpper(repository) + "_" +
          ToUpper(collector) + ".col";
 }
 
-bool ShareCollector::Exists(std::string_view repository, std::string_view collector) const {
+bool CShareCollector::Exists(std::string_view repository, std::string_view collector) const {
   return IsPlainName(repository) && IsPlainName(collector) &&
          platform::FileExists(PathOf(repository, collector));
 }
 
-CCollectorRecord ShareCollector::Read(std::string_view repository,
+CCollectorRecord CShareCollector::Read(std::string_view repository,
                                       std::string_view collector) const {
   return Guard<CShareCollectorException, CShareCollectorUnknownException>("ReadCollector", [&] {
     Trace(defs_.TraceLevel1(), "PILIB,FILIB,GILIB,REPLIB.(SHARELIB) ShareCollector.ReadCollector",
@@ -95,7 +95,7 @@ CCollectorRecord ShareCollector::Read(std::string_view repository,
     }
     if (kind == 7) ReadTexts(block, record, 2);
     if (!record.DefinitionName.empty()) {
-      record.Definition = ShareDefinition(defs_).Read(record.DefinitionName);
+      record.Definition = CShareDefinition(defs_).Read(record.DefinitionName);
     }
     return record;
   });

@@ -1,4 +1,4 @@
-// ShareCollector: the collector record file (group's repositories folder +
+// CShareCollector: the collector record file (group's repositories folder +
 // REPOSITORY_COLLECTOR.col), read only. The collector number names the
 // findex the collector fills; the kind (1 to 7) selects optional sections.
 #pragma once
@@ -40,9 +40,9 @@ struct CCollectorRecord {
   CDefinitionRecord Definition;
 };
 
-class ShareCollector {
+class CShareCollector {
  public:
-  explicit ShareCollector(const CGlobalDefs& defs) : defs_(defs) {}
+  explicit CShareCollector(const CGlobalDefs& defs) : defs_(defs) {}
   std::string PathOf(std::string_view repository, std::string_view collector) const;
   bool Exists(std::string_view repository, std::string_view collector) const;
   CCollectorRecord Read(std::string_view repository, std::string_view collector) const;

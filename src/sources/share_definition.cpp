@@ -8,11 +8,11 @@
 
 namespace qm {
 
-std::string ShareDefinition::PathOf(std::string_view name) const {
+std::string CShareDefinition::PathOf(std::string_view name) const {
   return defs_.GetFullDataPath(FolderKind::Definitions) + ToUpper(name) + ".def";
 }
 
-CDefinitionRecord ShareDefinition::Read(std::string_view name) const {
+CDefinitionRecord CShareDefinition::Read(std::string_view name) const {
   return Guard<CShareDefinitionException, CShareDefinitionUnknownException>(
       "ReadDefinition", [&] {
         RequirePlainName<CShareDefinitionException>("definition", name, "ReadDefinition");

@@ -1,4 +1,4 @@
-// ShareDefinition: the definition record file (group's definitions folder +
+// CShareDefinition: the definition record file (group's definitions folder +
 // NAME.def), read only. A record is block 0 of a 4,096-byte block file, its
 // fields in the block's item encoding one after another. Fields this engine
 // does not use are read and held by type.
@@ -29,9 +29,9 @@ struct CDefinitionRecord {
   std::vector<CDefinitionColumn> Columns;  // in file order
 };
 
-class ShareDefinition {
+class CShareDefinition {
  public:
-  explicit ShareDefinition(const CGlobalDefs& defs) : defs_(defs) {}
+  explicit CShareDefinition(const CGlobalDefs& defs) : defs_(defs) {}
   // The record file of name (a plain name).
   std::string PathOf(std::string_view name) const;
   CDefinitionRecord Read(std::string_view name) const;

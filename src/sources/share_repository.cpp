@@ -9,15 +9,15 @@
 
 namespace qm {
 
-std::string ShareRepository::PathOf(std::string_view name) const {
+std::string CShareRepository::PathOf(std::string_view name) const {
   return defs_.GetFullDataPath(FolderKind::Repositories) + ToUpper(name) + ".rep";
 }
 
-bool ShareRepository::Exists(std::string_view name) const {
+bool CShareRepository::Exists(std::string_view name) const {
   return IsPlainName(name) && platform::FileExists(PathOf(name));
 }
 
-CRepositoryRecord ShareRepository::Read(std::string_view name) const {
+CRepositoryRecord CShareRepository::Read(std::string_view name) const {
   return Guard<CShareRepositoryException, CShareRepositoryUnknownException>(
       "ReadRepository", [&] {
         RequirePlainName<CShareRepositoryException>("repository", name, "ReadRepository");
@@ -38,7 +38,7 @@ CRepositoryRecord ShareRepository::Read(std::string_view name) const {
           record.Members.emplace_back(std::move(collector), value);
         }
         if (!record.DefinitionName.empty()) {
-          record.Definition = ShareDefinition(defs_).Read(record.DefinitionName);
+          record.Definition = CShareDefinition(defs_).Read(record.DefinitionName);
         }
         return record;
       });

@@ -1,4 +1,4 @@
-// ShareRepository: the repository record file (group's repositories folder +
+// CShareRepository: the repository record file (group's repositories folder +
 // NAME.rep), read only: a named set of collectors, each filling one findex.
 // Layout as for every record file (sources/record_block.h).
 #pragma once
@@ -29,9 +29,9 @@ struct CRepositoryRecord {
   CDefinitionRecord Definition;
 };
 
-class ShareRepository {
+class CShareRepository {
  public:
-  explicit ShareRepository(const CGlobalDefs& defs) : defs_(defs) {}
+  explicit CShareRepository(const CGlobalDefs& defs) : defs_(defs) {}
   std::string PathOf(std::string_view name) const;
   // True when the record file exists (name must be plain, else false).
   bool Exists(std::string_view name) const;

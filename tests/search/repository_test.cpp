@@ -179,7 +179,7 @@ TEST_F(RepositoryTest, CollectorSectionsAndDefinitionsReadBackAsWritten) {
   c.Int(1).Text("u").Int(1).Int(2).Int(3).Int(4).Text("w");
   test::WriteFile(Folder("Repositories") + "WEB_SITE.col", c.Block());
 
-  const CCollectorRecord record = ShareCollector(defs_).Read("Web", "Site");
+  const CCollectorRecord record = CShareCollector(defs_).Read("Web", "Site");
   EXPECT_EQ(record.CollectorNumber, 42);
   EXPECT_EQ(record.CollectorKind, 2);
   EXPECT_EQ(record.Groups.at("g").at("k"), "v");
@@ -197,12 +197,12 @@ TEST_F(RepositoryTest, CollectorSectionsAndDefinitionsReadBackAsWritten) {
   cut.Text("").Int(1).Int(0).Int(0).Int(0).Text("only one of three texts");
   test::WriteFile(Folder("Repositories") + "WEB_CUT.col", cut.Block());
   try {
-    ShareCollector(defs_).Read("Web", "Cut");
+    CShareCollector(defs_).Read("Web", "Cut");
     ADD_FAILURE() << "a cut record was read";
   } catch (const CShareCollectorException& e) {
     EXPECT_NE(e.GetFullTextUtf8(kLevelGeneral).find("ReadCollector"), std::string::npos);
   }
-  EXPECT_THROW(ShareCollector(defs_).Read("Web", "Missing"), CShareCollectorException);
+  EXPECT_THROW(CShareCollector(defs_).Read("Web", "Missing"), CShareCollectorException);
 }
 
 }  // namespace

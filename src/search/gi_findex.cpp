@@ -40,23 +40,6 @@ bool IsKnownType(int32_t type) {
   }
 }
 
-std::u32string CodePoints(std::u16string_view text) {
-  std::u32string out;
-  out.reserve(text.size());
-  std::string utf8 = Utf16ToUtf8(text);
-  std::size_t pos = 0;
-  while (pos < utf8.size()) out.push_back(DecodeUtf8(utf8, pos));
-  return out;
-}
-
-std::u32string CodePointsUtf8(std::string_view utf8) {
-  std::u32string out;
-  out.reserve(utf8.size());
-  std::size_t pos = 0;
-  while (pos < utf8.size()) out.push_back(DecodeUtf8(utf8, pos));
-  return out;
-}
-
 }  // namespace
 
 struct CGiFIndex::LeafRow {
@@ -509,7 +492,7 @@ CLookupResult CGiFIndex::ScanPattern(CItems& items, const CWordSearch& word, int
 CLookupResult CGiFIndex::ScanSimilar(CItems& items, const CWordSearch& word, int32_t flags,
                                      int32_t modifier, int64_t limit) {
   const bool narrow = header_.FindexType == static_cast<int32_t>(VALUE_TYPE::AsciiString);
-  const std::u32string sought = CodePoints(word.word);
+  const std::u32string sought = CodePointsOf(word.word);
   int64_t allowed = 0;
   if ((flags & compare_flags::kSimilarPercent) != 0) {
     const int64_t percent = modifier >= 0 ? modifier : 25;
@@ -522,7 +505,8 @@ CLookupResult CGiFIndex::ScanSimilar(CItems& items, const CWordSearch& word, int
   CValue lowest(static_cast<VALUE_TYPE>(header_.FindexType));
   std::u32string candidate;
   return ReadMatchingRuns(items, Descend(lowest), limit, [&](const LeafRow& row) {
-    candidate = narrow ? CodePointsUtf8(row.value.narrow) : CodePoints(row.value.WideText());
+    candidate = narrow ? CodePointsOf(std::string_view(row.value.narrow))
+                       : CodePointsOf(std::u16string_view(row.value.WideText()));
     return std::pair{BoundedEditDistance(sought, candidate, bound) <= bound, true};
   });
 }

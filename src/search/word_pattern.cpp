@@ -4,8 +4,6 @@
 
 namespace qm {
 
-namespace {
-
 std::u32string CodePointsOf(std::u16string_view text) {
   std::u32string out;
   out.reserve(text.size());
@@ -29,6 +27,8 @@ std::u32string CodePointsOf(std::string_view utf8) {
   while (pos < utf8.size()) out.push_back(DecodeUtf8(utf8, pos));
   return out;
 }
+
+namespace {
 
 template <class View>
 bool StartsWith(View word, View prefix) {

@@ -12,6 +12,11 @@
 
 namespace qm {
 
+// The code points of a wide or a narrow (UTF-8) text: what patterns and the
+// similarity distance count as characters.
+std::u32string CodePointsOf(std::u16string_view text);
+std::u32string CodePointsOf(std::string_view utf8);
+
 class CWordPattern {
  public:
   // Result of Match.

@@ -25,6 +25,7 @@
 #include <string>
 #include <thread>
 
+#include "order_bench_root.h"
 #include "index/pi_order.h"
 #include "base/exception.h"
 #include "config/global_defs.h"
@@ -44,48 +45,17 @@ double PeakMegabytes() {
   return static_cast<double>(u.ru_maxrss) / 1024.0;
 }
 
-void Check(int rc, sqlite3* db, const char* what) {
-  if (rc != SQLITE_OK && rc != SQLITE_DONE && rc != SQLITE_ROW) {
-    throw std::runtime_error(std::string(what) + ": " + sqlite3_errmsg(db));
-  }
-}
-
 // A data root with the PUBLIC group's folders, and the rows database.
-class DataRoot {
+class DataRoot : public qm::bench::OrderBenchRoot {
  public:
-  DataRoot() {
-    char pattern[] = "/tmp/qm-order-bench.XXXXXX";
-    if (mkdtemp(pattern) == nullptr) throw std::runtime_error("cannot make a temporary folder");
-    path_ = std::string(pattern) + "/";
-    for (const char* sub :
-         {"Groups/PUBLIC/Config", "Groups/PUBLIC/WorkData", "Groups/PUBLIC/Orders"}) {
-      fs::create_directories(path_ + sub);
-    }
-  }
-  ~DataRoot() {
-    std::error_code ignored;
-    fs::remove_all(path_, ignored);
-  }
-  const std::string& Path() const { return path_; }
-  std::string Database() const { return path_ + "rows.db"; }
+  DataRoot() : OrderBenchRoot("order-bench") {}
 
   // Adds rows with keys first .. first + count - 1.
-  void AddRows(int64_t first, int64_t count) {
-    sqlite3* db = nullptr;
-    Check(sqlite3_open(Database().c_str(), &db), db, "open");
-    Check(sqlite3_exec(db,
-                       "CREATE TABLE IF NOT EXISTS t (id INTEGER PRIMARY KEY, n INTEGER, r REAL, "
-                       "d TIMESTAMP, label TEXT); BEGIN;",
-                       nullptr, nullptr, nullptr),
-          db, "create");
-    sqlite3_stmt* insert = nullptr;
-    Check(sqlite3_prepare_v2(db, "INSERT INTO t VALUES (?, ?, ?, ?, ?)", -1, &insert, nullptr), db,
-          "prepare");
+  void AddRows(int64_t first, int64_t count) const {
     std::mt19937_64 random(static_cast<uint64_t>(first));
     char date[32];
     char label[32];
-    for (int64_t key = first; key < first + count; ++key) {
-      sqlite3_bind_int64(insert, 1, key);
+    InsertRows(first, count, [&](sqlite3_stmt* insert, int64_t key) {
       if (key % 50 == 0) {
         sqlite3_bind_null(insert, 2);  // some NULLs
       } else {
@@ -100,16 +70,8 @@ class DataRoot {
       std::snprintf(label, sizeof label, "%s-word%05d", (random() % 2) ? "Alpha" : "beta",
                     static_cast<int>(random() % 25000));
       sqlite3_bind_text(insert, 5, label, -1, SQLITE_TRANSIENT);
-      Check(sqlite3_step(insert), db, "insert");
-      sqlite3_reset(insert);
-    }
-    sqlite3_finalize(insert);
-    Check(sqlite3_exec(db, "COMMIT;", nullptr, nullptr, nullptr), db, "commit");
-    sqlite3_close(db);
+    });
   }
-
- private:
-  std::string path_;
 };
 
 struct Timing {

@@ -22,6 +22,7 @@
 #include <string>
 #include <vector>
 
+#include "order_bench_root.h"
 #include "base/exception.h"
 #include "config/global_defs.h"
 #include "format/items.h"
@@ -34,45 +35,15 @@ namespace {
 namespace fs = std::filesystem;
 using Clock = std::chrono::steady_clock;
 
-void Check(int rc, sqlite3* db, const char* what) {
-  if (rc != SQLITE_OK && rc != SQLITE_DONE && rc != SQLITE_ROW) {
-    throw std::runtime_error(std::string(what) + ": " + sqlite3_errmsg(db));
-  }
-}
-
-class DataRoot {
+class DataRoot : public qm::bench::OrderBenchRoot {
  public:
-  DataRoot() {
-    char pattern[] = "/tmp/qm-result-order-bench.XXXXXX";
-    if (mkdtemp(pattern) == nullptr) throw std::runtime_error("cannot make a temporary folder");
-    path_ = std::string(pattern) + "/";
-    for (const char* sub : {"Groups/PUBLIC/Config", "Groups/PUBLIC/WorkData", "Groups/PUBLIC/Orders"}) {
-      fs::create_directories(path_ + sub);
-    }
-  }
-  ~DataRoot() {
-    std::error_code ignored;
-    fs::remove_all(path_, ignored);
-  }
-  const std::string& Path() const { return path_; }
-  std::string Database() const { return path_ + "rows.db"; }
+  DataRoot() : OrderBenchRoot("result-order-bench") {}
 
-  void AddRows(int64_t count) {
-    sqlite3* db = nullptr;
-    Check(sqlite3_open(Database().c_str(), &db), db, "open");
-    Check(sqlite3_exec(db,
-                       "CREATE TABLE t (id INTEGER PRIMARY KEY, n INTEGER, r REAL, d TIMESTAMP, "
-                       "label TEXT); BEGIN;",
-                       nullptr, nullptr, nullptr),
-          db, "create");
-    sqlite3_stmt* insert = nullptr;
-    Check(sqlite3_prepare_v2(db, "INSERT INTO t VALUES (?, ?, ?, ?, ?)", -1, &insert, nullptr), db,
-          "prepare");
+  void AddRows(int64_t count) const {
     std::mt19937_64 random(7);
     char date[32];
     char label[32];
-    for (int64_t key = 1; key <= count; ++key) {
-      sqlite3_bind_int64(insert, 1, key);
+    InsertRows(1, count, [&](sqlite3_stmt* insert, int64_t) {
       sqlite3_bind_int64(insert, 2, static_cast<int64_t>(random() % 20000));
       sqlite3_bind_double(insert, 3, static_cast<double>(random() % 2000000) / 7.0 - 100000.0);
       std::snprintf(date, sizeof date, "%04d-%02d-%02d %02d:%02d:%02d",
@@ -82,16 +53,8 @@ class DataRoot {
       sqlite3_bind_text(insert, 4, date, -1, SQLITE_TRANSIENT);
       std::snprintf(label, sizeof label, "word%05d", static_cast<int>(random() % 25000));
       sqlite3_bind_text(insert, 5, label, -1, SQLITE_TRANSIENT);
-      Check(sqlite3_step(insert), db, "insert");
-      sqlite3_reset(insert);
-    }
-    sqlite3_finalize(insert);
-    Check(sqlite3_exec(db, "COMMIT;", nullptr, nullptr, nullptr), db, "commit");
-    sqlite3_close(db);
+    });
   }
-
- private:
-  std::string path_;
 };
 
 void BuildOrder(qm::CGlobalDefs& defs, const char* name, std::initializer_list<const char*> columns) {

@@ -196,7 +196,7 @@ bool CGiTreeRowset::ScoreActive() const { return order_->ScoreActive(); }
 bool CGiTreeRowset::HasScores() const { return result_ && result_->Columns().s != 0; }
 
 int32_t CGiTreeRowset::CommandOfRow(int32_t row) const {
-  if (!command_column_) return 1;
+  if (!command_column_) return single_command_;
   return Rows("CommandOfRow").Row(row)[base_width_ - 1];
 }
 
@@ -280,12 +280,18 @@ void CGiTreeRowset::StartRowset(int32_t command_number, bool append) {
     if (append && open_) {
       CItems joined =
           AddResultset(NarrowedTo(*result_, base_width_), command_column_, items, command_number);
+      // The rows standing so far belong to the command evaluated first, which
+      // is not command 1 when an earlier statement failed.
+      if (!command_column_ && single_command_ != 1) {
+        for (int32_t i = 1; i <= total_; ++i) joined.Row(i)[joined.Width() - 1] = single_command_;
+      }
       result_ = std::make_unique<CItems>(std::move(joined));
       command_column_ = true;
       ++command_count_;
     } else {
       result_ = std::make_unique<CItems>(std::move(items));
       command_column_ = false;
+      single_command_ = command_number;
       command_count_ = 1;
       commands_.score_active = false;
     }

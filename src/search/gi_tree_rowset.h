@@ -72,7 +72,8 @@ class CGiTreeRowset {
   bool ScoreActive() const;
   // Whether the result rows carry a score column.
   bool HasScores() const;
-  // The row's command number in a result set of several commands, else 1.
+  // The command number of the row: its last column in a result set of
+  // several commands, else the one command evaluated.
   int32_t CommandOfRow(int32_t row) const;
 
   // --- ordering, groups and scores of the result rows (rowset_order.h) ---
@@ -133,6 +134,7 @@ class CGiTreeRowset {
   CGiCmdList commands_;
   std::unique_ptr<CItems> result_;
   bool command_column_ = false;
+  int32_t single_command_ = 1;  // the command of the rows while there is no command column
   int32_t first_ = 1;
   int32_t num_ = 0;
   int32_t total_ = 0;

@@ -254,6 +254,22 @@ TEST_F(SearchObjectTest, SeveralCommandsShareOneResultSetAndItsKeyFile) {
   EXPECT_EQ(test::ReadFile(Utf16ToUtf8(scored)), "100,1\r\n100,2\r\n99,6\r\n");
 }
 
+TEST_F(SearchObjectTest, AFailedStatementKeepsItsCommandNumberAndTheRestKeepTheirs) {
+  // Command 1 fails to parse and stays in the list; 2 and 3 hold the rows.
+  EXPECT_NE(Failure(search_->ExecuteEx(T(Statement("Nope='x'")), -1)), "");
+  ASSERT_EQ(search_->ExecuteEx(T(Statement("Plain='banana'")), -1), S_OK) << LastError();
+  EXPECT_EQ(Keys(), "(5,6)");
+  ASSERT_EQ(search_->ExecuteEx(T(Statement("Plain='pie'")), -1), S_OK) << LastError();
+  BSTR keys;
+  ASSERT_EQ(search_->GetRawKeyStringEx(0, 0, 2, &keys), S_OK) << LastError();
+  EXPECT_EQ(Utf16ToUtf8(keys), "(5,6)");
+  ASSERT_EQ(search_->GetRawKeyStringEx(0, 0, 1, &keys), S_OK) << LastError();
+  EXPECT_EQ(Utf16ToUtf8(keys), "()");
+  EXPECT_EQ(Keys(), "(1)");
+  EXPECT_EQ(Sql(), "SELECT id FROM docs WHERE id in (5,6)  AND id > 0 UNION ALL "
+                   "SELECT id FROM docs WHERE id in (1)  AND id > 0");
+}
+
 TEST_F(SearchObjectTest, ScoresAreAdjustedInRowOrder) {
   struct Case {
     double start, step;

@@ -56,8 +56,8 @@ void TraceBanner(std::string_view tag, std::string_view middle) {
   Trace(on, tag, kBannerFrame);
 }
 
-void AppendNumber(std::string& out, int64_t value) {
-  char digits[24];
+inline void AppendNumber(std::string& out, int32_t value) {
+  char digits[12];
   const auto [end, error] = std::to_chars(digits, digits + sizeof digits, value);
   (void)error;
   out.append(digits, end);
@@ -138,39 +138,60 @@ void CGiStartPoint::Close() {
 
 // --- results ---
 
+template <class Visit>
+void CGiStartPoint::ForEachWindowRow(int32_t command, Visit&& visit) {
+  const CGiTreeRowset& rowset = *rowset_;
+  const int32_t number = command == 0 ? rowset.Commands().Count() : command;
+  const CItems& rows = rowset.Result();
+  const bool score = rowset.ScoreActive() && rowset.HasScores();
+  const int32_t score_column = rows.Columns().ScoreColumn();
+  const int32_t last = rowset.GetFirst() + rowset.GetNum() - 1;
+  for (int32_t i = rowset.GetFirst(); i <= last; ++i) {
+    if (rowset.CommandOfRow(i) != number) continue;
+    visit(rows.Key(i), score ? rows.Row(i)[score_column] : 0);
+  }
+}
+
+CGiTreeRowset& CGiStartPoint::KeyWindow(const char* method, int32_t start, int32_t count,
+                                        int32_t command) {
+  CGiTreeRowset& rowset = OpenRowset(method);
+  Trace(TraceLevel1.load(), TagOf(method), "Start: %i, Count: %i, CmdNumber: %i", start, count,
+        command);
+  if (command < 0 || command > rowset.Commands().Count()) {
+    throw CGiStartPointException::Text("Command number not executed", method, nullptr);
+  }
+  if (count > 0) rowset.SetLimits(start, count);
+  return rowset;
+}
+
 std::string CGiStartPoint::KeyString(int32_t command) {
   CGiTreeRowset& rowset = *rowset_;
-  const int32_t number = command == 0 ? rowset.Commands().Count() : command;
   const std::string tag = TagOf("KeyString");
-  Trace(TraceLevel2.load(), tag, "Getting keys for cmd: %i", number);
+  Trace(TraceLevel2.load(), tag, "Getting keys for cmd: %i",
+        command == 0 ? rowset.Commands().Count() : command);
   const bool score = rowset.ScoreActive() && rowset.HasScores();
-  const CItems& rows = rowset.Result();
-  const int32_t first = rowset.GetFirst();
-  const int32_t last = first + rowset.GetNum() - 1;
   const int32_t group_count = rowset.Commands().score_group_count;
   const int32_t max_score =
       score && rowset.Commands().score_return_mode == 2 ? rowset.GetMaxScore() : 0;
 
   std::string keys;
+  // Room for the usual key of up to seven digits and its comma.
+  keys.reserve(static_cast<std::size_t>(rowset.GetNum()) * 8 + 16);
   int32_t count = 0;
   if (!score) {
     Trace(TraceLevel2.load(), tag, "score is not active");
     keys.push_back('(');
-    for (int32_t i = first; i <= last; ++i) {
-      if (rowset.CommandOfRow(i) != number) continue;
+    ForEachWindowRow(command, [&](int32_t key, int32_t) {
       if (count++ > 0) keys.push_back(',');
-      AppendNumber(keys, rows.Key(i));
-    }
+      AppendNumber(keys, key);
+    });
     keys.push_back(')');
   } else {
     Trace(TraceLevel2.load(), tag, "Score is active");
-    const int32_t score_column = rows.Columns().ScoreColumn();
     bool in_group = false;
     int32_t group_score = 0;
     int32_t in_this_group = 0;
-    for (int32_t i = first; i <= last; ++i) {
-      if (rowset.CommandOfRow(i) != number) continue;
-      const int32_t row_score = rows.Row(i)[score_column];
+    ForEachWindowRow(command, [&](int32_t key, int32_t row_score) {
       if (!in_group || row_score != group_score) {
         if (in_group) keys.append(");");
         AppendNumber(keys, ShownScore(row_score, max_score));
@@ -179,11 +200,11 @@ std::string CGiStartPoint::KeyString(int32_t command) {
         group_score = row_score;
         in_this_group = 0;
       }
-      if (group_count > 0 && in_this_group >= group_count) continue;
+      if (group_count > 0 && in_this_group >= group_count) return;
       if (in_this_group++ > 0) keys.push_back(',');
-      AppendNumber(keys, rows.Key(i));
+      AppendNumber(keys, key);
       ++count;
-    }
+    });
     if (in_group) keys.append(");");
   }
   if (count == 0) {
@@ -277,16 +298,11 @@ void CGiStartPoint::SetLimits(int32_t start, int32_t count) {
 std::string CGiStartPoint::GetRawKeyString(int32_t start, int32_t count, int32_t command) {
   constexpr const char* kMethod = "GetRawKeyString";
   return Public(kMethod, [&] {
-    CGiTreeRowset& rowset = OpenRowset(kMethod);
-    const std::string tag = TagOf(kMethod);
-    Trace(TraceLevel1.load(), tag, "Start: %i, Count: %i, CmdNumber: %i", start, count, command);
-    if (command < 0 || command > rowset.Commands().Count()) {
-      throw CGiStartPointException::Text("Command number not executed", kMethod, nullptr);
-    }
-    if (count > 0) rowset.SetLimits(start, count);
+    KeyWindow(kMethod, start, count, command);
     std::string keys = KeyString(command);
     RefreshCounts();
-    Trace(TraceLevel1.load(), tag, "Total: %i, Num: %i, Raw Key String: %s", total_, num_, keys);
+    Trace(TraceLevel1.load(), TagOf(kMethod), "Total: %i, Num: %i, Raw Key String: %s", total_,
+          num_, keys);
     return keys;
   });
 }
@@ -294,31 +310,22 @@ std::string CGiStartPoint::GetRawKeyString(int32_t start, int32_t count, int32_t
 std::string CGiStartPoint::GetRawKeyFile(int32_t start, int32_t count, int32_t command) {
   constexpr const char* kMethod = "GetRawKeyFile";
   return Public(kMethod, [&] {
-    CGiTreeRowset& rowset = OpenRowset(kMethod);
-    const std::string tag = TagOf(kMethod);
-    Trace(TraceLevel1.load(), tag, "Start: %i, Count: %i, CmdNumber: %i", start, count, command);
-    if (command < 0 || command > rowset.Commands().Count()) {
-      throw CGiStartPointException::Text("Command number not executed", kMethod, nullptr);
-    }
-    if (count > 0) rowset.SetLimits(start, count);
-    const int32_t number = command == 0 ? rowset.Commands().Count() : command;
+    CGiTreeRowset& rowset = KeyWindow(kMethod, start, count, command);
     const bool score = rowset.ScoreActive() && rowset.HasScores();
     const int32_t max_score =
         score && rowset.Commands().score_return_mode == 2 ? rowset.GetMaxScore() : 0;
-    const CItems& rows = rowset.Result();
     std::string text;
+    text.reserve(static_cast<std::size_t>(rowset.GetNum()) * (score ? 12 : 9));
     int32_t written = 0;
-    const int32_t last = rowset.GetFirst() + rowset.GetNum() - 1;
-    for (int32_t i = rowset.GetFirst(); i <= last; ++i) {
-      if (rowset.CommandOfRow(i) != number) continue;
+    ForEachWindowRow(command, [&](int32_t key, int32_t row_score) {
       if (score) {
-        AppendNumber(text, ShownScore(rows.Row(i)[rows.Columns().ScoreColumn()], max_score));
+        AppendNumber(text, ShownScore(row_score, max_score));
         text.push_back(',');
       }
-      AppendNumber(text, rows.Key(i));
+      AppendNumber(text, key);
       text.append("\r\n");
       ++written;
-    }
+    });
     if (key_file_.empty()) key_file_ = SLGetTempWorkFilePath(defs_, kTempCallerKeyFile);
     platform::FileHandle file =
         platform::OpenFile(key_file_, O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC);
@@ -326,6 +333,7 @@ std::string CGiStartPoint::GetRawKeyFile(int32_t start, int32_t count, int32_t c
         file.Close() != 0) {
       throw CGiStartPointException::Text("Error writing key file %s", kMethod, nullptr, key_file_);
     }
+    const std::string tag = TagOf(kMethod);
     Trace(TraceLevel2.load(), tag, "Count: %i, Key File: %s", written, key_file_);
     RefreshCounts();
     Trace(TraceLevel1.load(), tag, "Total: %i, Num: %i, Raw Key File: %s", total_, num_, key_file_);

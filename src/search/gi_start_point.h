@@ -102,6 +102,13 @@ class CGiStartPoint {
 
  private:
   CGiTreeRowset& OpenRowset(const char* method);
+  // The open result set after the checks of the raw key calls and their
+  // window (count 0 keeps it).
+  CGiTreeRowset& KeyWindow(const char* method, int32_t start, int32_t count, int32_t command);
+  // Calls visit(key, score) for the window's rows of the command (0: the
+  // last); the score is 0 unless the rows are ordered by score.
+  template <class Visit>
+  void ForEachWindowRow(int32_t command, Visit&& visit);
   // The key string of a command over the window (the rows of that command).
   std::string KeyString(int32_t command);
   // A score as written in key strings and key files.

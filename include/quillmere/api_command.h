@@ -30,7 +30,7 @@ namespace qm {
 
 class CExceptionBase;
 
-class APICommand {
+class QM_API APICommand {
  public:
   static constexpr const char16_t* kProgId = u"QuillmereAPI.APICommand.1";
 

@@ -30,7 +30,7 @@ namespace qm {
 
 class CExceptionBase;
 
-class APISearch {
+class QM_API APISearch {
  public:
   static constexpr const char16_t* kProgId = u"QuillmereAPI.APISearch.1";
 

@@ -6,6 +6,14 @@
 #include <cstdint>
 #include <string>
 
+// What libquillmere exports: the API objects, these functions and the C
+// interface of quillmere.h; everything else in it is hidden.
+#if defined(__GNUC__)
+#define QM_API __attribute__((visibility("default")))
+#else
+#define QM_API
+#endif
+
 namespace qm {
 
 // Every API method returns S_OK or DISP_E_EXCEPTION; nothing else, and no C++
@@ -36,9 +44,9 @@ struct ErrorInfo {
 };
 
 // Installs info as the calling thread's error information, replacing any.
-void SetErrorInfo(const ErrorInfo& info);
+QM_API void SetErrorInfo(const ErrorInfo& info);
 // Takes the calling thread's error information: false when there is none. The
 // thread has none afterwards.
-bool GetErrorInfo(ErrorInfo& info);
+QM_API bool GetErrorInfo(ErrorInfo& info);
 
 }  // namespace qm

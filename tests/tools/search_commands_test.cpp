@@ -200,6 +200,10 @@ TEST_F(SearchCommandsTest, RowsComeFromTheSavedOrTheGivenConnection) {
             "3\tMountain\triver\\tview\t\n"
             "2\tThe river and the river bank\t\t20\n");
 
+  // Unordered, the statement's own SQL decides.
+  r = Host({"search", std::string(kRiver) + " ORDER BY title DESC", "--rows"});
+  EXPECT_EQ(r.out, "id\ttitle\n2\tThe river and the river bank\n1\tRiver fish\n4\tQuiet river\n")
+      << r.err;
   r = Host({"search", kRiver, "--start", "2", "--count", "1", "--rows"});
   EXPECT_EQ(r.out, "id\ttitle\n2\tThe river and the river bank\n") << r.err;
   r = Host({"search", "SELECT id,title FROM books WHERE [Books='zebra']", "--rows"});

@@ -47,8 +47,10 @@ void PrintHelp() {
       "             by tabs otherwise; a tab, line end or backslash in a value shows\n"
       "             as \\t, \\n, \\r or \\\\. The data source is --connect or --dsn when\n"
       "             given, else the connection the first findex of the statement was\n"
-      "             built with. With the key column among the columns the rows come\n"
-      "             in the search's order, ties included.\n\n"
+      "             built with. Once the search is ordered (--order-by, or ORDER BY\n"
+      "             inside the brackets) and the key column is among the columns,\n"
+      "             the rows come in the search's order, ties included; otherwise\n"
+      "             as the SQL orders them.\n\n"
       "Exit status: 0 done, 1 the search failed (message on standard error),\n"
       "2 usage error.\n",
       kUsage);
@@ -142,7 +144,7 @@ int RunSearch(const GlobalOptions& global, const std::vector<std::string>& args)
       if (search.GetRawKeyFile(0, 0, &text) != S_OK) return session.Fail();
       break;
     case Output::Rows:
-      return PrintSearchRows(session, global, statement);
+      return PrintSearchRows(session, global, statement, order_by.has_value());
   }
   std::printf("%s\n", Utf16ToUtf8(text).c_str());
   return kExitOk;

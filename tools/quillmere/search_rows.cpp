@@ -54,17 +54,9 @@ std::vector<int64_t> KeysOf(std::string_view key_string) {
   return keys;
 }
 
-// The first findex the statement searches: the one whose header keeps the
-// connection its rows came from.
-std::string FirstFindex(const CGlobalDefs& defs, const std::string& statement) {
-  CGiCmdTree command(defs);
-  command.SplitSqlW(Utf8ToUtf16(statement));
-  return Utf16ToUtf8(CGiCmdTree::FindFirstIndexW(command.Root()));
-}
-
 // Points defs at the data source of the rows; false after the message when
-// there is none to use.
-bool UseConnection(HostSession& session, const GlobalOptions& global, const std::string& statement,
+// there is none to use. command: the statement, parsed.
+bool UseConnection(HostSession& session, const GlobalOptions& global, const CGiCmdTree& command,
                    CGlobalDefs& defs) {
   if (!global.connect.empty()) {
     defs.SetConnection(global.connect, CGlobalDefs::DisplayNameOf(global.connect));
@@ -75,7 +67,9 @@ bool UseConnection(HostSession& session, const GlobalOptions& global, const std:
                              global.dsn);
     return true;
   }
-  const std::string findex = FirstFindex(defs, statement);
+  // The first findex searched: its header keeps the connection its rows
+  // came from.
+  const std::string findex = Utf16ToUtf8(CGiCmdTree::FindFirstIndexW(command.Root()));
   CIndexHeader header;
   try {
     header = ReadFindexHeaderShared(defs, findex);
@@ -125,7 +119,7 @@ struct FetchedRow {
 }  // namespace
 
 int PrintSearchRows(HostSession& session, const GlobalOptions& global,
-                    const std::string& statement) {
+                    const std::string& statement, bool ordered_by_host) {
   APISearch& search = session.Search();
   BSTR sql;
   BSTR key_string;
@@ -138,7 +132,11 @@ int PrintSearchRows(HostSession& session, const GlobalOptions& global,
   std::vector<FetchedRow> rows;
   try {
     CGlobalDefs defs(session.Defs());
-    if (!UseConnection(session, global, statement, defs)) return kExitError;
+    // Parsed again here (the search object keeps its commands to itself) for
+    // its first findex and its own ORDER BY.
+    CGiCmdTree command(defs);
+    command.SplitSqlW(Utf8ToUtf16(statement));
+    if (!UseConnection(session, global, command, defs)) return kExitError;
     CShareDatabase db(defs);
     db.Connect();
     int16_t columns = 0;
@@ -148,7 +146,9 @@ int PrintSearchRows(HostSession& session, const GlobalOptions& global,
     const std::vector<int64_t> keys = KeysOf(Utf16ToUtf8(key_string));
     std::unordered_map<int64_t, std::size_t> places;
     for (std::size_t i = 0; i < keys.size(); ++i) places.emplace(keys[i], i);
-    const int key_index = key_column.empty() ? 0 : db.GetColumnIndex(Utf16ToUtf8(key_column));
+    const bool ordered = ordered_by_host || command.HasOrder();
+    const int key_index =
+        !ordered || key_column.empty() ? 0 : db.GetColumnIndex(Utf16ToUtf8(key_column));
 
     CValue value;
     while (columns > 0 && db.IsRowAvailable()) {

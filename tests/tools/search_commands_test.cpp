@@ -46,13 +46,16 @@ class SearchCommandsTest : public ::testing::Test {
     ASSERT_EQ(Host({"options", "set", "index-general", "igoSupportScore=1"}).status, 0);
     connect_ = Database("books.db", {
         "create table books (id integer, title varchar(60), year integer, genre varchar(20), "
-        "price real, note varchar(40), added timestamp)",
+        "price real, note varchar(40), added timestamp, cover blob)",
         "insert into books values"
-        " (1, 'River fish', 1990, 'nature', 12.5, 'first', '2024-01-11 10:00:00'),"
-        " (2, 'The river and the river bank', 1985, 'nature', 20, NULL, '2024-02-12 10:00:00'),"
-        " (3, 'Mountain', 1985, 'travel', NULL, 'river' || char(9) || 'view', '2024-03-13 10:00:00'),"
-        " (4, 'Quiet river', 2001, 'fiction', 8.25, 'Ünïcode', '2024-04-14 10:00:00'),"
-        " (5, 'Fish market', 2001, 'travel', 15, 'line' || char(10) || 'two', '2024-01-11 09:00:00')"});
+        " (1, 'River fish', 1990, 'nature', 12.5, 'first', '2024-01-11 10:00:00', X'00010203'),"
+        " (2, 'The river and the river bank', 1985, 'nature', 20, NULL,"
+        "  '2024-02-12 10:00:00', NULL),"
+        " (3, 'Mountain', 1985, 'travel', NULL, 'river' || char(9) || 'view',"
+        "  '2024-03-13 10:00:00', NULL),"
+        " (4, 'Quiet river', 2001, 'fiction', 8.25, 'Ünïcode', '2024-04-14 10:00:00', NULL),"
+        " (5, 'Fish market', 2001, 'travel', 15, 'line' || char(10) || 'two',"
+        "  '2024-01-11 09:00:00', NULL)"});
     for (const char* statement :
          {"CREATE FINDEX Books ON TABLE books COLUMNS title KEY id",
           "CREATE FINDEX Scored ON TABLE books COLUMNS title:CONTENT_WEIGHT=5,note KEY id",
@@ -164,7 +167,8 @@ TEST_F(SearchCommandsTest, ScoresOrderTheKeysAndShowAsPercentagesInKeysKeyFilesA
             "--option", "SCORE_RETURN=2"});
   EXPECT_EQ(r.out, "4\n" + keys + "\n") << r.err;
 
-  r = Host({"search", statement, "--option", "SCORE_RETURN=2", "--order-by", "SCORE", "--key-file"});
+  r = Host(
+      {"search", statement, "--option", "SCORE_RETURN=2", "--order-by", "SCORE", "--key-file"});
   ASSERT_EQ(r.status, 0) << r.err;
   ASSERT_FALSE(r.out.empty());
   const std::string file = r.out.substr(0, r.out.size() - 1);
@@ -206,6 +210,10 @@ TEST_F(SearchCommandsTest, RowsComeFromTheSavedOrTheGivenConnection) {
       << r.err;
   r = Host({"search", kRiver, "--start", "2", "--count", "1", "--rows"});
   EXPECT_EQ(r.out, "id\ttitle\n2\tThe river and the river bank\n") << r.err;
+  // A binary value shows its size; the work file it was read into goes.
+  r = Host({"search", "SELECT id,cover FROM books WHERE [Books='river']", "--rows"});
+  EXPECT_EQ(r.out, "id\tcover\n1\t(4 bytes)\n2\t\n4\t\n") << r.err;
+  EXPECT_TRUE(fs::is_empty(dir_.Path() + "data/Groups/PUBLIC/WorkData"));
   r = Host({"search", "SELECT id,title FROM books WHERE [Books='zebra']", "--rows"});
   EXPECT_EQ(r.out, "id\ttitle\n") << r.err;
 
@@ -303,7 +311,9 @@ TEST_F(SearchCommandsTest, WordsListsAFindexsWordsByFilterAndWindow) {
            {{"Books", "--start", "7"}, 0, ""},
            {{"Books", "--count", "0"}, 0, ""},
            // Accents are removed as the findex was built: UNICODE.
-           {{"Scored", "--filter", "*i*"}, 0, "FIRST\nFISH\nLINE\nMOUNTAIN\nQUIET\nRIVER\nUNICODE\nVIEW\n"},
+           {{"Scored", "--filter", "*i*"},
+            0,
+            "FIRST\nFISH\nLINE\nMOUNTAIN\nQUIET\nRIVER\nUNICODE\nVIEW\n"},
        }) {
     const Result r = Host(With({"words"}, c.args));
     EXPECT_EQ(r.status, c.status) << c.args.back() << "\n" << r.err;
@@ -322,7 +332,9 @@ TEST_F(SearchCommandsTest, GroupsPrintEachValueOfTheColumnWithItsRows) {
     std::string order_by, column, out;
   };
   // A date/time reads as its date: year * 65536 + month * 256 + day.
-  const auto day = [](int month, int day) { return std::to_string(2024 * 65536 + month * 256 + day); };
+  const auto day = [](int month, int day) {
+    return std::to_string(2024 * 65536 + month * 256 + day);
+  };
   for (const Case& c : std::vector<Case>{
            {"books.year", "books.year", "1985\t2\n1990\t1\n2001\t2\n"},
            {"books.year DESC", "BOOKS.YEAR", "2001\t2\n1990\t1\n1985\t2\n"},

@@ -31,25 +31,21 @@ namespace {
 std::vector<int64_t> KeysOf(std::string_view key_string) {
   std::vector<int64_t> keys;
   bool inside = false;
-  for (std::size_t at = 0; at < key_string.size();) {
-    const char c = key_string[at];
-    if (c == '(' || c == ')') {
-      inside = c == '(';
-      ++at;
-      continue;
+  const char* at = key_string.data();
+  const char* const end = at + key_string.size();
+  while (at < end) {
+    const char c = *at;
+    if (c == '(' || c == ')') inside = c == '(';
+    if (inside && c != '(' && c != ',') {
+      int64_t key = 0;
+      const auto [next, error] = std::from_chars(at, end, key);
+      if (error == std::errc()) {
+        keys.push_back(key);
+        at = next;
+        continue;
+      }
     }
-    if (!inside || c == ',') {
-      ++at;
-      continue;
-    }
-    int64_t key = 0;
-    const auto [end, error] = std::from_chars(key_string.data() + at, key_string.data() + key_string.size(), key);
-    if (error != std::errc()) {
-      ++at;
-      continue;
-    }
-    keys.push_back(key);
-    at = static_cast<std::size_t>(end - key_string.data());
+    ++at;
   }
   return keys;
 }
@@ -99,7 +95,9 @@ std::string ValueText(CShareDatabase& db, int index, CValue& value) {
     const std::string file(value.Narrow());
     const int64_t bytes = platform::PathFileSize(file);
     platform::UnlinkFile(file);
-    return "(" + std::to_string(std::max<int64_t>(bytes, 0)) + " bytes)";
+    std::string text = std::to_string(std::max<int64_t>(bytes, 0));
+    text.insert(text.begin(), '(');
+    return text.append(" bytes)");
   }
   switch (value.GetType()) {
     case VALUE_TYPE::Integer: return std::to_string(value.GetInteger());

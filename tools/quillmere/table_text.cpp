@@ -8,8 +8,8 @@ namespace {
 
 // Characters, not bytes: continuation bytes of UTF-8 do not count.
 std::size_t Width(std::string_view text) {
-  return static_cast<std::size_t>(std::count_if(
-      text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
+  const auto starts_character = [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; };
+  return static_cast<std::size_t>(std::count_if(text.begin(), text.end(), starts_character));
 }
 
 }  // namespace

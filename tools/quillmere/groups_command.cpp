@@ -20,7 +20,7 @@ void PrintHelp() {
       "Runs the search statement, orders its result by LIST (as search --order-by:\n"
       "SCORE, KEY, ORDER.COLUMN, each ASC or DESC), collects the runs of rows with\n"
       "equal values and prints, for each distinct value of the column C (one of\n"
-      "the LIST, or SCORE or KEY) in that order, one line: value<TAB>rows.\n"
+      "the columns of LIST) in that order, one line: value<TAB>rows.\n"
       "  quillmere groups \"SELECT id FROM books WHERE [Books='river']\" \\\n"
       "      --order-by Books.year --column Books.year\n"
       "Values are numbers as the order keeps them: integers, doubles cut to whole\n"

@@ -62,6 +62,21 @@ bool HostSession::Open(const GlobalOptions& options) {
   if (command_->LoadDefaultIndexOptions() != S_OK || command_->LoadDefaultOrderOptions() != S_OK) {
     return Fail(), false;
   }
+  return SetUpDefs(options);
+}
+
+bool HostSession::OpenSearch(const GlobalOptions& options) {
+  search_ = std::make_unique<APISearch>();
+  if (!options.data_dir.empty() && search_->SetDataPath(Text(options.data_dir)) != S_OK) {
+    return Fail(), false;
+  }
+  if (!options.group.empty() && search_->SetGroup(Text(options.group)) != S_OK) {
+    return Fail(), false;
+  }
+  return SetUpDefs(options);
+}
+
+bool HostSession::SetUpDefs(const GlobalOptions& options) {
   group_ = options.group.empty() ? "PUBLIC" : options.group;
   try {
     if (!options.data_dir.empty()) defs_.SetDataPath(options.data_dir);

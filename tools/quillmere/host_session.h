@@ -1,6 +1,7 @@
-// The command object of one host invocation, set up from the global options:
-// data path, group, data-source connection, and the group's saved default
-// options.
+// The API object of one host invocation, set up from the global options: the
+// command object with data path, group, data-source connection and the
+// group's saved default options, or the search object with data path and
+// group.
 #pragma once
 
 #include <deque>
@@ -11,6 +12,7 @@
 #include "command_registry.h"
 #include "config/global_defs.h"
 #include "quillmere/api_command.h"
+#include "quillmere/api_search.h"
 
 namespace qm::cli {
 
@@ -23,6 +25,10 @@ class HostSession {
   // error.
   bool Open(const GlobalOptions& options);
   APICommand& Command() { return *command_; }
+  // The same for the search object; the connection options are the
+  // caller's (a search reads no data source).
+  bool OpenSearch(const GlobalOptions& options);
+  APISearch& Search() { return *search_; }
 
   // A text argument that stays valid for the session.
   const BSTR* Text(std::string_view utf8);
@@ -49,11 +55,14 @@ class HostSession {
 
  private:
   bool Require(bool there, std::string_view what, std::string_view name);
+  // Data path and group of the host's own settings.
+  bool SetUpDefs(const GlobalOptions& options);
 
   std::string name_;
   std::string group_;
   CGlobalDefs defs_;
   std::unique_ptr<APICommand> command_;
+  std::unique_ptr<APISearch> search_;
   std::deque<BSTR> texts_;
 };
 

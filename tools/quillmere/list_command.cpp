@@ -18,6 +18,7 @@
 #include "index/order_file_set.h"
 #include "platform/file_io.h"
 #include "platform/terminal.h"
+#include "table_text.h"
 #include "terminal_text.h"
 
 namespace qm::cli {
@@ -26,7 +27,7 @@ namespace {
 constexpr const char* kUsage = "list";
 constexpr const char* kDamaged = "damaged";
 
-using Row = std::vector<std::string>;
+using Row = TableRow;
 
 const Row kHeading{"NAME",    "KIND",    "TYPE",   "KEYS",  "WORDS",
                    "ADD-ONS", "DELETED", "BYTES",  "BUILT", "UPDATED"};
@@ -119,24 +120,6 @@ Row OrderRow(HostSession& session, const std::string& name) {
   return row;
 }
 
-void Print(const std::vector<Row>& rows, bool aligned) {
-  std::vector<std::size_t> widths(kHeading.size(), 0);
-  for (const Row& row : rows) {
-    for (std::size_t i = 0; i < row.size(); ++i) widths[i] = std::max(widths[i], row[i].size());
-  }
-  std::string out;
-  for (const Row& row : rows) {
-    std::string line;
-    for (std::size_t i = 0; i < row.size(); ++i) {
-      if (i > 0) line += aligned ? "  " : "\t";
-      line += row[i];
-      if (aligned && i + 1 < row.size()) line.append(widths[i] - row[i].size(), ' ');
-    }
-    out += line + "\n";
-  }
-  std::fputs(out.c_str(), stdout);
-}
-
 int RunList(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("list");
   if (args.size() == 1 && IsHelpFlag(args[0])) {
@@ -159,7 +142,7 @@ int RunList(const GlobalOptions& global, const std::vector<std::string>& args) {
   } catch (const CExceptionBase& e) {
     return session.Fail(TerminalText(e));
   }
-  Print(rows, platform::IsTerminal(stdout));
+  std::fputs(TableText(rows, platform::IsTerminal(stdout)).c_str(), stdout);
   return kExitOk;
 }
 

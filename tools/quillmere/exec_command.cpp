@@ -1,5 +1,7 @@
 // quillmere exec: runs one command statement through the command object,
 // blocking, or as a background job whose progress the host shows.
+#include <sys/stat.h>
+
 #include <chrono>
 #include <map>
 #include <cstdio>
@@ -141,14 +143,34 @@ bool RequireTarget(HostSession& session, const Target& t) {
   }
 }
 
-// The headers of a findex and its add-ons, by file name; unreadable ones left out.
-std::map<std::string, CIndexHeader> FindexHeaders(CGlobalDefs& defs, const std::string& name) {
-  std::map<std::string, CIndexHeader> headers;
+// One file of a findex as it stands: its header and the identity and change
+// time of its .sdx. A rebuild swaps a new file in and an update rewrites it,
+// so either moves the stamp even within the second the header's times show.
+struct FindexFileState {
+  CIndexHeader header;
+  ino_t inode = 0;
+  int64_t changed_ns = 0;
+
+  bool SameAs(const FindexFileState& other) const {
+    return inode == other.inode && changed_ns == other.changed_ns && header == other.header;
+  }
+};
+
+// The files of a findex and its add-ons, by file name; unreadable ones left out.
+std::map<std::string, FindexFileState> FindexStates(CGlobalDefs& defs, const std::string& name) {
+  std::map<std::string, FindexFileState> states;
   for (int32_t n = 0;; ++n) {
     const std::string file = n == 0 ? ToUpper(name) : findex::AddOnName(name, n);
-    if (!FindexFilesExist(defs, file)) return headers;
+    if (!FindexFilesExist(defs, file)) return states;
     try {
-      headers.emplace(file, ReadFindexHeaderShared(defs, file));
+      FindexFileState state;
+      state.header = ReadFindexHeaderShared(defs, file);
+      struct stat info {};
+      if (::stat(findex::PathsOf(defs, file).sdx.c_str(), &info) == 0) {
+        state.inode = info.st_ino;
+        state.changed_ns = int64_t{info.st_mtim.tv_sec} * 1000000000 + info.st_mtim.tv_nsec;
+      }
+      states.emplace(file, std::move(state));
     } catch (const CExceptionBase&) {
     }
   }
@@ -156,18 +178,19 @@ std::map<std::string, CIndexHeader> FindexHeaders(CGlobalDefs& defs, const std::
 
 // "exec: 1.25 s, ..." for a statement that has run.
 std::string Summary(HostSession& session, const Target& t, double seconds,
-                    const std::map<std::string, CIndexHeader>& before) {
+                    const std::map<std::string, FindexFileState>& before) {
   char time[32];
   std::snprintf(time, sizeof time, "%.2f s", seconds);
   std::string line = "exec: " + std::string(time);
   try {
     if (t.type == kCmdFindexStored || t.type == kCmdFindexDefined) {
-      // The files this build wrote are those whose header changed.
+      // The files this build wrote are those that changed.
       int64_t rows = 0, words = 0, keys = 0;
-      for (const auto& [file, header] : FindexHeaders(session.Defs(), t.findex)) {
+      for (const auto& [file, state] : FindexStates(session.Defs(), t.findex)) {
+        const CIndexHeader& header = state.header;
         keys += header.KeyCount;
         const auto old = before.find(file);
-        if (old != before.end() && old->second == header) continue;
+        if (old != before.end() && old->second.SameAs(state)) continue;
         rows += header.KeyCount;
         words += header.WordCount;
       }
@@ -208,9 +231,9 @@ int RunExec(const GlobalOptions& global, const std::vector<std::string>& args) {
   if (!session.Open(global)) return kExitError;
   const Target target = TargetOf(statement);
   if (!RequireTarget(session, target)) return kExitError;
-  std::map<std::string, CIndexHeader> before;
+  std::map<std::string, FindexFileState> before;
   if (!quiet && (target.type == kCmdFindexStored || target.type == kCmdFindexDefined)) {
-    before = FindexHeaders(session.Defs(), target.findex);
+    before = FindexStates(session.Defs(), target.findex);
   }
   const auto start = std::chrono::steady_clock::now();
   const BSTR* text = session.Text(statement);

@@ -139,7 +139,7 @@ std::u16string CGiRepository::GetSeparators() const {
     const CIndexHeader& header = findexes_.front()->Header();
     std::u16string separators =
         BuildSeparators(header.Separators, (header.GeneralFlags & kAddDefaultSeparators) != 0);
-    if (separators.empty()) separators = u" ";
+    if (separators.empty()) separators.push_back(u' ');
     return separators;
   });
 }

@@ -1,6 +1,9 @@
 #include "quillmere/api_command.h"
 
+#include <utility>
+
 #include "api/api_arguments.h"
+#include "api/api_invoke.h"
 #include "api/component_load.h"
 #include "api/error_report.h"
 #include "command/pi_start_point.h"
@@ -13,7 +16,6 @@ namespace qm {
 namespace {
 
 constexpr std::string_view kTraceTag = "APICommand";
-constexpr const char16_t* kFatalError = u"Fatal error. This error is unrecoverable";
 
 // Remote servers (and the synchronisation servers) come with remote access;
 // until then these calls fail and the object stays unconnected, so every
@@ -40,19 +42,7 @@ APICommand::~APICommand() = default;
 
 template <class Body>
 HRESULT APICommand::Invoke(Body&& body) {
-  try {
-    try {
-      body();
-      return S_OK;
-    } catch (const CExceptionBase& e) {
-      return ReportError(e);
-    } catch (...) {
-      return ReportError(std::u16string(kFatalError));
-    }
-  } catch (...) {
-    // Reporting itself failed (no memory left for the text).
-    return DISP_E_EXCEPTION;
-  }
+  return InvokeMethod(*this, std::forward<Body>(body));
 }
 
 HRESULT APICommand::ReportError(const CExceptionBase& error) {

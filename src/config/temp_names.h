@@ -19,6 +19,7 @@ enum TempNameCaller : int32_t {
   kTempCallerOrderFiles = 6,         // an order build's files before the swap
   kTempCallerOptionFiles = 9,        // an option file before its rename
   kTempCallerSortRuns = 44,          // the sort's entry files
+  kTempCallerKeyFile = 60,           // a search's key file for the host
   kTempCallerBinaryColumn = 81,      // a binary column value copied to a work file
   kTempCallerConverterOutput = 83,   // what an external converter writes
   kTempCallerDocument = 84,          // a fetched or copied document

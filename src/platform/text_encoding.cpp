@@ -91,10 +91,15 @@ void AppendUtf8AsUtf16(std::string_view text, std::u16string& out) {
   out.reserve(out.size() + text.size());
   std::size_t pos = 0;
   while (pos < text.size()) {
-    const unsigned char b = static_cast<unsigned char>(text[pos]);
-    if (b < 0x80) {
-      out.push_back(b);
-      ++pos;
+    // A run of ASCII bytes (key strings, SQL) is widened in one pass.
+    std::size_t end = pos;
+    while (end < text.size() && static_cast<unsigned char>(text[end]) < 0x80) ++end;
+    if (end > pos) {
+      const std::size_t at = out.size();
+      out.resize(at + (end - pos));
+      char16_t* to = out.data() + at;
+      for (std::size_t i = pos; i < end; ++i) *to++ = static_cast<unsigned char>(text[i]);
+      pos = end;
     } else {
       EncodeUtf16(DecodeUtf8(text, pos), out);
     }

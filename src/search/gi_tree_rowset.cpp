@@ -4,12 +4,14 @@
 #include <charconv>
 #include <cstring>
 #include <limits>
+#include <span>
 #include <string_view>
 #include <utility>
 
 #include "base/exception_family.h"
 #include "base/trace.h"
 #include "config/global_defs.h"
+#include "format/index_options.h"
 #include "index/deleted_keys.h"
 #include "platform/text_encoding.h"
 #include "search/condition_tree.h"
@@ -126,7 +128,26 @@ struct CGiTreeRowset::Context {
   int32_t word_count = 1;
 };
 
-CGiTreeRowset::CGiTreeRowset(const CGlobalDefs& defs) : defs_(defs) {}
+namespace {
+
+// The rows cut back to their first width columns (the attached order columns
+// dropped).
+CItems NarrowedTo(const CItems& rows, int32_t width) {
+  if (rows.Width() <= width) return rows;
+  CColumnSet set = rows.Columns();
+  set.b = static_cast<uint16_t>(set.b - (rows.Width() - width));
+  CItems narrowed(set);
+  narrowed.AllocateMemory(rows.Count());
+  for (int32_t i = 0; i < rows.Count(); ++i) {
+    narrowed.InsertItem(std::span<const int32_t>(rows.Row(i), static_cast<std::size_t>(width)));
+  }
+  return narrowed;
+}
+
+}  // namespace
+
+CGiTreeRowset::CGiTreeRowset(const CGlobalDefs& defs)
+    : defs_(defs), order_(std::make_unique<CGiRowsetOrder>(defs)) {}
 
 CGiTreeRowset::~CGiTreeRowset() {
   Trace(TraceLevel2.load(), TagOf("~CGiTreeRowset"), "Destroying TreeRowset");
@@ -141,6 +162,97 @@ void CGiTreeRowset::Close() {
   first_ = 1;
   num_ = 0;
   truncated_ = false;
+  base_width_ = 0;
+  // The attached orders give their reader locks back.
+  order_->Reset({});
+}
+
+CItems& CGiTreeRowset::Rows(const char* method) const {
+  if (!result_) throw CGiTreeRowsetException::Text("No open result set", method, nullptr);
+  return *result_;
+}
+
+RowsetOrderContext CGiTreeRowset::OrderContext() const {
+  RowsetOrderContext context;
+  if (commands_.first_header) {
+    context.score_support = (commands_.first_header->GeneralFlags & kIgoSupportScore) != 0;
+    context.key_column = commands_.first_header->KeyColumn;
+  }
+  if (commands_.Count() > 0 && commands_.Command(1).IsParsed()) {
+    context.part_count = commands_.Command(1).PartCount();
+  }
+  context.score_group_count = commands_.score_group_count;
+  return context;
+}
+
+std::string CGiTreeRowset::SqlOrder(bool without_score) const {
+  return order_->SqlOrderString(without_score);
+}
+
+bool CGiTreeRowset::AddOrderClause() const { return order_->AddOrderClause(); }
+
+bool CGiTreeRowset::ScoreActive() const { return order_->ScoreActive(); }
+
+bool CGiTreeRowset::HasScores() const { return result_ && result_->Columns().s != 0; }
+
+int32_t CGiTreeRowset::CommandOfRow(int32_t row) const {
+  if (!command_column_) return single_command_;
+  return Rows("CommandOfRow").Row(row)[base_width_ - 1];
+}
+
+void CGiTreeRowset::OrderBy(std::string_view list, bool add_order_clause) {
+  CItems& rows = Rows("SetOrder");
+  const RowsetOrderContext context = OrderContext();
+  order_->SetOrder(rows, list, add_order_clause, context);
+  order_->SortItems(rows, context);
+}
+
+void CGiTreeRowset::CollectGroups() { order_->CollectItems(Rows("CollectGroups")); }
+
+void CGiTreeRowset::MoveNext() { order_->MoveNext(); }
+
+void CGiTreeRowset::MovePrev() { order_->MovePrev(); }
+
+bool CGiTreeRowset::IsEOB() const { return order_->IsEOB(); }
+
+int32_t CGiTreeRowset::GetTotalGroups() const { return order_->GetTotalGroups(); }
+
+int32_t CGiTreeRowset::GetNumGroups() const { return order_->GetNumGroups(); }
+
+int32_t CGiTreeRowset::GetValue(std::string_view column) const {
+  return order_->GetValue(Rows("GetValue"), column, OrderContext());
+}
+
+int32_t CGiTreeRowset::GetCount(std::string_view column) const {
+  return order_->GetCount(Rows("GetValue"), column, OrderContext());
+}
+
+std::string CGiTreeRowset::GetGroupString(std::string_view column) const {
+  return order_->GetGroupString(Rows("GetGroupString"), column, OrderContext(), first_, num_);
+}
+
+std::u16string CGiTreeRowset::GetGroupSql(int32_t start, int32_t count,
+                                          std::string_view column) {
+  CItems& rows = Rows("GetGroupString");
+  SetLimits(start, count);
+  const RowsetOrderContext context = OrderContext();
+  const std::string sql = order_->GetGroupSql(
+      rows, column, context, first_, num_, [&](const std::string& keys) {
+        CGiCmdTree& command = commands_.Command(1);
+        command.RebuildSql(Utf8ToUtf16(keys), false, Utf8ToUtf16(context.key_column));
+        return Utf16ToUtf8(command.Condition());
+      });
+  return Utf8ToUtf16(sql);
+}
+
+int32_t CGiTreeRowset::GetMaxScore() {
+  return order_->GetMaxScore(Rows("GetMaxWeight"), OrderContext());
+}
+
+void CGiTreeRowset::AdjustScore(double start_value, double step_value, int32_t adjustment,
+                                int32_t stop_count, bool stop_at_zero) {
+  order_->AdjustWeight(Rows("AdjustWeight"), OrderContext(), start_value, step_value, adjustment,
+                       stop_count, stop_at_zero);
 }
 
 void CGiTreeRowset::SetLimits(int32_t start, int32_t count) {
@@ -164,22 +276,30 @@ void CGiTreeRowset::StartRowset(int32_t command_number, bool append) {
     if (!append || !open_) truncated_ = false;
     CItems items = Evaluate(command.Root(), Context{});
     const int32_t found = ResultRows(items);
-    if (commands_.first_header) sql_order_ = commands_.first_header->KeyColumn + " ASC";
 
     if (append && open_) {
-      CItems joined = AddResultset(*result_, command_column_, items, command_number);
+      CItems joined =
+          AddResultset(NarrowedTo(*result_, base_width_), command_column_, items, command_number);
+      // The rows standing so far belong to the command evaluated first, which
+      // is not command 1 when an earlier statement failed.
+      if (!command_column_ && single_command_ != 1) {
+        for (int32_t i = 1; i <= total_; ++i) joined.Row(i)[joined.Width() - 1] = single_command_;
+      }
       result_ = std::make_unique<CItems>(std::move(joined));
       command_column_ = true;
       ++command_count_;
     } else {
       result_ = std::make_unique<CItems>(std::move(items));
       command_column_ = false;
+      single_command_ = command_number;
       command_count_ = 1;
       commands_.score_active = false;
     }
     total_ = ResultRows(*result_);
     first_ = 1;
     num_ = total_;
+    base_width_ = result_->Width();
+    order_->Reset(commands_.first_header ? commands_.first_header->KeyColumn : std::string());
     open_ = true;
     Trace(TraceLevel1.load(), TagOf("StartRowset"), "Total resulting items for search: %i", found);
   });

@@ -15,9 +15,11 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <string_view>
 
 #include "format/items.h"
 #include "search/cmd_list.h"
+#include "search/rowset_order.h"
 
 namespace qm {
 
@@ -61,8 +63,39 @@ class CGiTreeRowset {
   // The result rows, count row first. REQUIRES: IsOpen().
   const CItems& Result() const { return *result_; }
   // The order string of the SQL side: the first findex's key column + " ASC"
-  // after each evaluation.
-  const std::string& SqlOrder() const { return sql_order_; }
+  // after each evaluation, then the last order list applied. without_score
+  // drops its SCORE items.
+  std::string SqlOrder(bool without_score = false) const;
+  // Whether the SQL gets " order by " and the order string.
+  bool AddOrderClause() const;
+  // Whether the rows were last ordered by SCORE: key strings then group by score.
+  bool ScoreActive() const;
+  // Whether the result rows carry a score column.
+  bool HasScores() const;
+  // The command number of the row: its last column in a result set of
+  // several commands, else the one command evaluated.
+  int32_t CommandOfRow(int32_t row) const;
+
+  // --- ordering, groups and scores of the result rows (rowset_order.h) ---
+  // Applies an order list (rounding scores first while a score group count
+  // is set), then sorts. A failing list leaves the rows and order as they were.
+  void OrderBy(std::string_view list, bool add_order_clause);
+  void CollectGroups();
+  void MoveNext();
+  void MovePrev();
+  bool IsEOB() const;
+  int32_t GetTotalGroups() const;
+  int32_t GetNumGroups() const;
+  // The current group's value and count of the column, and the group string
+  // of the window's groups.
+  int32_t GetValue(std::string_view column) const;
+  int32_t GetCount(std::string_view column) const;
+  std::string GetGroupString(std::string_view column) const;
+  // Sets the window, then the SQL of command 1 for the window's groups.
+  std::u16string GetGroupSql(int32_t start, int32_t count, std::string_view column);
+  int32_t GetMaxScore();
+  void AdjustScore(double start_value, double step_value, int32_t adjustment,
+                   int32_t stop_count, bool stop_at_zero);
 
   // Combines two key-sorted arrays by an operator code with the scoring
   // rules of the codes; the result has the left array's columns. flags: the
@@ -91,18 +124,25 @@ class CGiTreeRowset {
   std::u16string NormaliseWord(const std::u16string& word, const CIndexHeader& header);
   int32_t LimitRows(const CColumnSet& columns) const;
 
+  RowsetOrderContext OrderContext() const;
+  // The result rows; raises "No open result set" naming method when none.
+  CItems& Rows(const char* method) const;
+
   const CGlobalDefs& defs_;
   int32_t command_count_ = 0;
   bool open_ = false;
   CGiCmdList commands_;
   std::unique_ptr<CItems> result_;
   bool command_column_ = false;
+  int32_t single_command_ = 1;  // the command of the rows while there is no command column
   int32_t first_ = 1;
   int32_t num_ = 0;
   int32_t total_ = 0;
   int32_t cache_size_ = 0;
   bool truncated_ = false;
-  std::string sql_order_;
+  // The width of the rows as evaluated, before order columns were attached.
+  int32_t base_width_ = 0;
+  std::unique_ptr<CGiRowsetOrder> order_;
   std::unique_ptr<CLanguage> language_;
 };
 

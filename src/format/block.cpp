@@ -607,29 +607,4 @@ int32_t CBlock::GetRowStopIdDescending(const CValue& key) {
   return StopSearch(key, static_cast<int>(StopRule::Greater));
 }
 
-int32_t CBlock::GetNodeChildId(const CValue& key) {
-  constexpr const char* kMethod = "GetNodeChildId";
-  RequireOpen(kMethod);
-  if (used_ == kHeaderBytes) return -1;
-  cursor_ = kHeaderBytes;
-  int64_t p = Readable(4);
-  if (p < 0) ReadFailure(kMethod, "Error reading id (1)", cursor_);
-  int32_t child = bytes::LoadI32(buffer_.data() + p);
-  cursor_ += 4;
-  while (!AtEnd()) {
-    const int32_t at = cursor_;
-    BlockValue separator;
-    if (!TryReadValue(key.GetType(), separator)) {
-      if (ValueBytes(key) < 0) UnrecognizedType(kMethod, key);
-      ReadFailure(kMethod, "Error reading row (2)", at);
-    }
-    if (separator.Compare(key) != -1) return child;
-    p = Readable(4);
-    if (p < 0) ReadFailure(kMethod, "Error reading id (2)", cursor_);
-    child = bytes::LoadI32(buffer_.data() + p);
-    cursor_ += 4;
-  }
-  return child;
-}
-
 }  // namespace qm

@@ -150,10 +150,6 @@ class CBlock {
   // For rows in descending order: the id of the first row not greater than
   // key; -1 when the last is greater.
   int32_t GetRowStopIdDescending(const CValue& key);
-  // In a node (leading child, then separator and child pairs): the child
-  // before the first separator not smaller than key, or the last child; -1
-  // for a node without rows.
-  int32_t GetNodeChildId(const CValue& key);
 
  private:
   bool HasRoomForRow(const CValue& key, const char* method);

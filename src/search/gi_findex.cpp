@@ -42,17 +42,16 @@ bool IsKnownType(int32_t type) {
 
 }  // namespace
 
-struct CGiFIndex::LeafRow {
-  BlockValue value;
-  int64_t position = 0;
-};
-
 CGiFIndex::CGiFIndex(const CGlobalDefs& defs) : defs_(defs) {}
 
 CGiFIndex::~CGiFIndex() = default;
 
 void CGiFIndex::Open(std::string_view name) {
-  Guarded("Open", [&] { OpenFiles(name); });
+  Guarded("Open", [&] { OpenFiles(name, false); });
+}
+
+void CGiFIndex::OpenAsIs(std::string_view name) {
+  Guarded("Open", [&] { OpenFiles(name, true); });
 }
 
 bool CGiFIndex::TryOpen(std::string_view name) {
@@ -63,12 +62,12 @@ bool CGiFIndex::TryOpen(std::string_view name) {
       Close();
       return false;
     }
-    OpenFiles(name);
+    OpenFiles(name, false);
     return true;
   });
 }
 
-void CGiFIndex::OpenFiles(std::string_view name) {
+void CGiFIndex::OpenFiles(std::string_view name, bool as_is) {
   RequirePlainName<CGiFIndexException>("findex", name, "Open");
   Close();
   const findex::FilePaths paths = findex::PathsOf(defs_, name);
@@ -80,22 +79,26 @@ void CGiFIndex::OpenFiles(std::string_view name) {
   try {
     header_.ReadInfo(sdx_);
     block_count_ = sdx_.BlockCount();
-    if (header_.BlockNum >= 2) {
-      if (header_.BlockNum > block_count_) {
-        Damaged("Open", "the header counts " + std::to_string(header_.BlockNum) +
-                            " blocks, the word tree holds " + std::to_string(block_count_));
-      }
-      if (!IsKnownType(header_.FindexType)) {
-        Damaged("Open", "unknown value type " + std::to_string(header_.FindexType));
-      }
+    const bool words = header_.BlockNum >= 2;
+    if (words && header_.BlockNum > block_count_ && !as_is) {
+      Damaged("Open", "the header counts " + std::to_string(header_.BlockNum) +
+                          " blocks, the word tree holds " + std::to_string(block_count_));
+    }
+    if (words && !IsKnownType(header_.FindexType)) {
+      Damaged("Open", "unknown value type " + std::to_string(header_.FindexType));
+    }
+    fst_size_ = 0;
+    if (words || as_is) {
       platform::FileHandle fst =
           platform::OpenFileAs(fst_path_, platform::FileAccess::Read,
                                platform::FileDisposition::OpenExisting);
-      if (!fst.IsOpen()) Damaged("Open", "its item file " + fst_path_ + " cannot be opened");
-      fst_size_ = platform::FileSize(fst.Get());
-      if (fst_size_ < 0) Damaged("Open", "the size of " + fst_path_ + " cannot be read");
-    } else {
-      fst_size_ = 0;
+      fst_size_ = fst.IsOpen() ? platform::FileSize(fst.Get()) : -1;
+      if (!fst.IsOpen() && !as_is) {
+        Damaged("Open", "its item file " + fst_path_ + " cannot be opened");
+      }
+      if (fst.IsOpen() && fst_size_ < 0 && !as_is) {
+        Damaged("Open", "the size of " + fst_path_ + " cannot be read");
+      }
     }
   } catch (...) {
     sdx_.Close();
@@ -144,21 +147,57 @@ CBlock& CGiFIndex::TreeBlock(int level, int32_t number) {
   return blocks_[slot];
 }
 
+template <class OnChild, class OnSeparator>
+bool CGiFIndex::ReadNodeEntries(int level, int32_t number, OnChild on_child,
+                                OnSeparator on_separator) {
+  CBlock& node = TreeBlock(level, number);
+  if (node.GetUsed() == CBlock::kHeaderBytes) return false;
+  const auto type = static_cast<VALUE_TYPE>(header_.FindexType);
+  try {
+    node.SetCursor(CBlock::kHeaderBytes);
+    on_child(node.ReadInt());
+    while (!node.AtEnd()) {
+      if (!on_separator(node.ReadValueView(type))) break;
+      if (node.AtEnd()) break;
+      on_child(node.ReadInt());
+    }
+  } catch (const CException& e) {
+    Damaged("ReadNode", "tree block " + std::to_string(number) + " does not decode", &e);
+  }
+  return true;
+}
+
+template <class Visit>
+bool CGiFIndex::VisitLeafRows(int32_t number, Visit&& visit) {
+  CBlock& leaf = TreeBlock(3, number);
+  const auto type = static_cast<VALUE_TYPE>(header_.FindexType);
+  leaf.SetCursor(CBlock::kHeaderBytes);
+  while (!leaf.AtEnd()) {
+    LeafRow row;
+    try {
+      row.value = leaf.ReadValueView(type);
+      row.position = leaf.ReadInt();
+    } catch (const CException& e) {
+      Damaged("ReadLeaf", "leaf block " + std::to_string(number) + " does not decode", &e);
+    }
+    if (!visit(row)) return false;
+  }
+  return true;
+}
+
 int32_t CGiFIndex::Descend(const CValue& value) {
   if (header_.BlockNum < 2) return 0;
   int32_t number = 1;
   for (int level = 0; level < 3; ++level) {
-    CBlock& node = TreeBlock(level, number);
-    if (node.GetUsed() == CBlock::kHeaderBytes) {
+    // The child before the first separator not below the value, else the last.
+    int32_t child = 0;
+    const bool entries = ReadNodeEntries(
+        level, number, [&](int32_t c) { child = c; },
+        [&](const BlockValue& separator) { return separator.Compare(value) == -1; });
+    if (!entries) {
       // An empty root is an empty tree; an empty node below it is the end
       // leaf that follows the last word.
       return level == 0 ? 0 : number;
-    }
-    int32_t child = 0;
-    try {
-      child = node.GetNodeChildId(value);
-    } catch (const CException& e) {
-      Damaged("Descend", "tree block " + std::to_string(number) + " cannot be read", &e);
     }
     // A node written after a split comes after its first child, so only the
     // range is checked; the descent has its fixed number of levels.
@@ -171,6 +210,48 @@ int32_t CGiFIndex::Descend(const CValue& value) {
   return number;
 }
 
+void CGiFIndex::ReadTreeBlock(int level, int32_t number) {
+  Guarded("ReadTreeBlock", [&] {
+    RequireOpen("ReadTreeBlock");
+    if (level < 0 || level > 3) {
+      throw CGiFIndexException::Text("No tree level %i", "ReadTreeBlock", nullptr, level);
+    }
+    TreeBlock(level, number);
+  });
+}
+
+CGiFIndex::Node CGiFIndex::ReadNode(int level, int32_t number) {
+  return Guarded("ReadNode", [&] {
+    RequireOpen("ReadNode");
+    if (level < 0 || level > 2) {
+      throw CGiFIndexException::Text("No node level %i", "ReadNode", nullptr, level);
+    }
+    Node node;
+    ReadNodeEntries(
+        level, number, [&](int32_t child) { node.children.push_back(child); },
+        [&](const BlockValue& separator) {
+          separator.CopyTo(node.separators.emplace_back());
+          return true;
+        });
+    return node;
+  });
+}
+
+CGiFIndex::LeafLinks CGiFIndex::ReadLeafLinks(int32_t number) {
+  return Guarded("ReadLeafLinks", [&] {
+    RequireOpen("ReadLeafLinks");
+    const CBlock& leaf = TreeBlock(3, number);
+    return LeafLinks{leaf.GetLinkWord1(), leaf.GetLinkWord2()};
+  });
+}
+
+bool CGiFIndex::ReadLeafRows(int32_t number, const std::function<bool(const LeafRow&)>& visit) {
+  return Guarded("ReadLeafRows", [&] {
+    RequireOpen("ReadLeafRows");
+    return VisitLeafRows(number, visit);
+  });
+}
+
 int32_t CGiFIndex::FindLeaf(const CValue& value, int32_t& block) {
   return Guarded("FindLeaf", [&] {
     RequireOpen("FindLeaf");
@@ -180,29 +261,21 @@ int32_t CGiFIndex::FindLeaf(const CValue& value, int32_t& block) {
 }
 
 void CGiFIndex::WalkLeaves(int32_t block, const std::function<bool(const LeafRow&)>& visit) {
-  const auto type = static_cast<VALUE_TYPE>(header_.FindexType);
   int64_t last_position = 0;
   int32_t number = block;
   while (number != 0) {
-    CBlock& leaf = TreeBlock(3, number);
-    leaf.SetCursor(CBlock::kHeaderBytes);
-    while (!leaf.AtEnd()) {
-      LeafRow row;
-      try {
-        row.value = leaf.ReadValueView(type);
-        row.position = leaf.ReadInt();
-      } catch (const CException& e) {
-        Damaged("ReadLeaf", "leaf block " + std::to_string(number) + " cannot be read", &e);
-      }
+    const bool whole = VisitLeafRows(number, [&](const LeafRow& row) {
       if (row.position < last_position || row.position > fst_size_) {
         Damaged("ReadLeaf", "leaf block " + std::to_string(number) + " holds item position " +
                                 std::to_string(row.position) + " (item file " +
                                 std::to_string(fst_size_) + " bytes)");
       }
       last_position = row.position;
-      if (!visit(row)) return;
-    }
-    const int32_t next = leaf.GetLinkWord1();
+      return visit(row);
+    });
+    if (!whole) return;
+    // Still the leaf level's block, unless the visit read another leaf.
+    const int32_t next = TreeBlock(3, number).GetLinkWord1();
     // Leaves are written in ascending block order: a link back is damage,
     // and following it could go round for ever.
     if (next != 0 && (next <= number || next >= block_count_)) {
@@ -282,14 +355,25 @@ int64_t CGiFIndex::RunEnd(int64_t position) {
   });
 }
 
-int64_t CGiFIndex::RunEndAt(int64_t position) {
+int32_t CGiFIndex::RunRows(int64_t position) {
+  return Guarded("RunRows", [&] {
+    RequireOpen("RunRows");
+    return RunRowsAt(position);
+  });
+}
+
+int32_t CGiFIndex::RunRowsAt(int64_t position) {
   if (position < 0 || position + 4 > fst_size_) {
     Damaged("RunEnd", "a run at " + std::to_string(position) + " lies outside the item file (" +
                           std::to_string(fst_size_) + " bytes)");
   }
   uint8_t raw[4] = {0, 0, 0, 0};
   ReadFst(position, raw, sizeof raw, "RunEnd");
-  const int64_t count = bytes::LoadI32(raw);
+  return bytes::LoadI32(raw);
+}
+
+int64_t CGiFIndex::RunEndAt(int64_t position) {
+  const int64_t count = RunRowsAt(position);
   const int64_t end = position + count * RowSize();
   if (count < 1 || end > fst_size_) {
     Damaged("RunEnd", "the run at " + std::to_string(position) + " counts " +

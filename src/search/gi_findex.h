@@ -21,8 +21,10 @@
 #include <string_view>
 #include <vector>
 
+#include "base/value.h"
 #include "format/bfile.h"
 #include "format/block.h"
+#include "format/block_value.h"
 #include "format/index_header.h"
 
 namespace qm {
@@ -121,10 +123,53 @@ class CGiFIndex {
   void GetFindexWordsW(const CWordPattern& filter, int32_t first, int32_t last,
                        std::vector<std::u16string>& words, int32_t& total);
 
+  // --- The files piece by piece: the reads every lookup is made of, for a
+  // caller that walks the whole findex (the findex check). Tree levels are
+  // numbered 0 (root) to 3 (leaf). Damage raises as in a lookup.
+
+  // As Open, but what a walk can still read past stays open: a word tree
+  // with more or fewer blocks than its header counts (BlockCount against
+  // Header().BlockNum), and an item file that cannot be opened
+  // (ItemFileSize() -1). The item file is sized even when there are no words.
+  void OpenAsIs(std::string_view name);
+  // Blocks of the .sdx, the header's block 0 included.
+  int64_t BlockCount() const { return block_count_; }
+
+  // Reads tree block number for a level unless that level holds it already;
+  // a block that cannot be read raises here, before its entries are decoded.
+  void ReadTreeBlock(int level, int32_t number);
+
+  // A node block (levels 0 to 2) as written: a leading child, then pairs of
+  // separator and child. A node that ends after a separator holds as many
+  // separators as children; an empty one holds neither.
+  struct Node {
+    std::vector<int32_t> children;
+    std::vector<CValue> separators;
+  };
+  Node ReadNode(int level, int32_t number);
+
+  // One leaf row: a word and the position of its run in the .fst.
+  struct LeafRow {
+    BlockValue value;
+    int64_t position = 0;
+  };
+  // A leaf's links to the next and the previous leaf, 0 for none.
+  struct LeafLinks {
+    int32_t next = 0;
+    int32_t previous = 0;
+  };
+  LeafLinks ReadLeafLinks(int32_t number);
+  // Calls visit for each row of the leaf in order until it returns false;
+  // visit reads no other leaf, and a row's value lives as long as the leaf
+  // stays read. Returns whether every row was visited.
+  bool ReadLeafRows(int32_t number, const std::function<bool(const LeafRow&)>& visit);
+
+  // The rows of the run at position, its count row included, as the count
+  // row says (not checked against the file beyond the count row itself).
+  int32_t RunRows(int64_t position);
+
  private:
   static constexpr int32_t kBlockUnits = 64;  // 4,096-byte tree blocks
-  // One leaf row as the scans see it.
-  struct LeafRow;
   // Where the first word at or after a value stands.
   struct Boundary {
     int64_t position = 0;  // its run, or the item file's size when there is none
@@ -132,11 +177,20 @@ class CGiFIndex {
     bool equal = false;    // the word equals the value
   };
 
-  void OpenFiles(std::string_view name);
+  void OpenFiles(std::string_view name, bool as_is);
   void RequireOpen(const char* method) const;
   // The tree block at a level (0 root .. 3 leaf), read unless that level
   // already holds it.
   CBlock& TreeBlock(int level, int32_t number);
+  // Reads the node block at a level entry by entry: on_child(child) for the
+  // leading child and each child after a separator, on_separator(value)
+  // for each separator, the read ending when it returns false. False for a
+  // block without entries.
+  template <class OnChild, class OnSeparator>
+  bool ReadNodeEntries(int level, int32_t number, OnChild on_child, OnSeparator on_separator);
+  // The rows of a leaf, as ReadLeafRows.
+  template <class Visit>
+  bool VisitLeafRows(int32_t number, Visit&& visit);
   // The leaf block where value stands or would stand; 0 for an empty tree.
   int32_t Descend(const CValue& value);
   // The first word not below value, or above it with after.
@@ -149,6 +203,7 @@ class CGiFIndex {
   CLookupResult ScanPattern(CItems& items, const CWordSearch& word, int64_t limit);
   CLookupResult ScanSimilar(CItems& items, const CWordSearch& word, int32_t flags,
                             int32_t modifier, int64_t limit);
+  int32_t RunRowsAt(int64_t position);
   int64_t RunEndAt(int64_t position);
   void ReadFst(int64_t position, uint8_t* data, std::size_t n, const char* method);
   // Appends the rows of [start, stop) under the limit; runs counts the runs

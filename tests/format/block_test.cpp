@@ -369,7 +369,6 @@ TEST(DamagedBlocks, RandomContentsGiveAnswersOrBlockErrors) {
     survives([&] { block.GetRowStopId(key); });
     survives([&] { block.GetRowStopIdAtOrAfter(key); });
     survives([&] { block.GetRowStopIdDescending(key); });
-    survives([&] { block.GetNodeChildId(key); });
     survives([&] {
       block.SetCursor(6);
       CValue v(type);

@@ -57,6 +57,8 @@ TEST_P(DamagedFilesTest, DamagedFindexesAndOrdersAreDroppedOrRebuiltFromTheirHea
   const std::vector<Case> cases = {
       {"truncated .sdx", true,
        [this] { fs::resize_file(IndexFolder() + "BOOKS.sdx", 4096 + 100); }, true},
+      {".sdx cut inside its header", true,
+       [this] { fs::resize_file(IndexFolder() + "BOOKS.sdx", 100); }, false},
       {"missing .fst", true, [this] { fs::remove(IndexFolder() + "BOOKS.fst"); }, true},
       {"damaged .sri", false,
        [this] { test::WriteFile(Orders() + "TITLES.sri", std::string(4096, '\x55')); },

@@ -3,16 +3,18 @@
 // splits, batches of postings, and the limits of the tree and the postings.
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
-#include "index/findex_check.h"
-#include "index/findex_files_writer.h"
-#include "support/findex_decoder.h"
-#include "platform/text_encoding.h"
-#include "support/raised_error.h"
 #include "base/exception_family.h"
+#include "config/global_defs.h"
 #include "format/mfile.h"
+#include "index/findex_files_writer.h"
+#include "platform/text_encoding.h"
+#include "search/findex_check.h"
+#include "support/findex_decoder.h"
+#include "support/raised_error.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -40,6 +42,13 @@ std::vector<Entry> LongWords(int count, std::size_t length, int vary = 0) {
 
 class FindexFilesTest : public ::testing::Test {
  protected:
+  void SetUp() override {
+    // The files stand where a findex T of the data directory would.
+    std::filesystem::create_directories(dir_.Path() + "Groups/PUBLIC/Indexes");
+    defs_.SetDataPath(dir_.Path());
+    defs_.SetGroup("PUBLIC");
+  }
+
   FindexWriteCounts Write(const std::vector<Entry>& entries, int32_t flags, int32_t type = 2,
                           FindexLimits limits = {}, std::function<void(int32_t)> observer = {}) {
     test::WriteSortedFile(dir_.Path() + "sorted", entries, flags);
@@ -52,13 +61,14 @@ class FindexFilesTest : public ::testing::Test {
   }
   DecodedFindex Decode(int32_t flags, int32_t type = 2) const {
     // Every findex written whole passes the check that operators run.
-    EXPECT_EQ(CheckFindexPair(Sdx(), Fst()), std::vector<std::string>{});
+    EXPECT_EQ(CheckFindexFiles(defs_, "T"), std::vector<std::string>{});
     return test::DecodeFindex(Sdx(), Fst(), type, flags);
   }
-  std::string Sdx() const { return dir_.Path() + "t.sdx"; }
-  std::string Fst() const { return dir_.Path() + "t.fst"; }
+  std::string Sdx() const { return dir_.Path() + "Groups/PUBLIC/Indexes/T.sdx"; }
+  std::string Fst() const { return dir_.Path() + "Groups/PUBLIC/Indexes/T.fst"; }
 
   test::ScratchDir dir_{"findex-files"};
+  CGlobalDefs defs_;
   CIndexHeader header_;
 };
 

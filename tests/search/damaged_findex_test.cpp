@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "base/byte_layout.h"
+#include "search/findex_check.h"
 #include "search/lookup_fixture.h"
 
 namespace qm {
@@ -129,6 +130,8 @@ TEST_F(DamagedFindexTest, CutFilesBadCountsAndStrayLinksAreErrorsNamingTheFindex
   for (const DamageCase& c : cases) {
     SCOPED_TRACE(c.name);
     Copy(c.name, c.sdx, c.fst);
+    // The check reads what lookups read: what they meet, it reports.
+    EXPECT_NE(CheckFindexFiles(defs_, c.name), std::vector<std::string>{});
     if (c.every_lookup) {
       ExpectEveryLookupFailsNaming(c.name, c.name);
     } else {
@@ -173,6 +176,9 @@ TEST_F(DamagedFindexTest, RandomBytesInTreeAndItemBlocksNeverCrashOrHang) {
     const std::vector<std::string> errors = Errors(name);
     failed += errors.empty() ? 0 : 1;
     answered += errors.size() < 7 ? 1 : 0;
+    if (!errors.empty()) {
+      EXPECT_NE(CheckFindexFiles(defs_, name), std::vector<std::string>{}) << errors.front();
+    }
     std::filesystem::remove(IndexFolder() + name + ".sdx");
     std::filesystem::remove(IndexFolder() + name + ".fst");
   }

@@ -14,6 +14,7 @@
 #include "base/exception_family.h"
 #include "format/column_set.h"
 #include "format/items.h"
+#include "search/findex_check.h"
 #include "search/gi_findex.h"
 #include "search/gi_repository.h"
 #include "search/item_runs.h"
@@ -61,6 +62,8 @@ class LookupFixture : public CommandFixture {
     }
     Sql(statements);
     ASSERT_EQ(Run("CREATE FINDEX " + findex + " ON TABLE " + table + " COLUMNS v KEY id"), "");
+    // Every findex a build writes passes the check that operators run.
+    EXPECT_EQ(CheckFindexFiles(defs_, findex), std::vector<std::string>{});
   }
 
   // Looks word up in every findex of the view of name, as one key-sorted array.

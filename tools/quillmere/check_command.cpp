@@ -7,12 +7,12 @@
 
 #include "command_registry.h"
 #include "host_session.h"
-#include "index/findex_check.h"
 #include "index/findex_file_set.h"
 #include "index/findex_files.h"
 #include "index/order_check.h"
 #include "index/order_file_set.h"
 #include "platform/text_encoding.h"
+#include "search/findex_check.h"
 #include "terminal_text.h"
 
 namespace qm::cli {

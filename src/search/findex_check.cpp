@@ -1,26 +1,21 @@
-#include "index/findex_check.h"
-
-#include <fcntl.h>
+#include "search/findex_check.h"
 
 #include <algorithm>
 #include <cstdint>
 #include <optional>
-#include <set>
 
-#include "base/byte_layout.h"
 #include "base/exception.h"
 #include "base/value.h"
 #include "config/global_defs.h"
-#include "format/bfile.h"
-#include "format/block.h"
 #include "format/column_set.h"
-#include "format/findex_tree.h"
 #include "format/index_header.h"
+#include "format/items.h"
 #include "index/damage_text.h"
 #include "index/deleted_keys.h"
 #include "index/findex_file_set.h"
 #include "locks/lock_manager.h"
 #include "platform/file_io.h"
+#include "search/gi_findex.h"
 
 namespace qm {
 
@@ -45,35 +40,38 @@ std::string LevelName(int level) {
 // The walk of one findex's pair of files.
 class PairCheck {
  public:
-  PairCheck(const findex::FilePaths& paths, std::vector<std::string>& problems)
-      : paths_(paths), problems_(problems), problems_at_start_(problems.size()),
-        sdx_name_(FileName(paths.sdx)), fst_name_(FileName(paths.fst)) {}
+  PairCheck(const CGlobalDefs& defs, std::string_view name, std::vector<std::string>& problems)
+      : name_(name), paths_(findex::PathsOf(defs, name)), problems_(problems),
+        problems_at_start_(problems.size()), sdx_name_(FileName(paths_.sdx)),
+        fst_name_(FileName(paths_.fst)), findex_(defs) {}
 
   void Run() {
     if (!platform::FileExists(paths_.sdx)) return Problem(sdx_name_ + ": missing");
     try {
-      sdx_.OpenFile(paths_.sdx, BFile::kReadOnly, CFindexTreeWriter::kBlockUnits);
-      header_.ReadInfo(sdx_);
+      findex_.OpenAsIs(name_);
     } catch (const CExceptionBase& e) {
-      return Problem(sdx_name_ + " header (block 0): does not read: " +
-                     DamageText(e));
+      return Problem(sdx_name_ + " header (block 0): does not read: " + DamageText(e));
     }
-    if (!OpenPostings()) return;
-    const int64_t blocks = sdx_.BlockCount();
-    if (header_.BlockNum < 2) {
+    const CIndexHeader& header = findex_.Header();
+    fst_size_ = findex_.ItemFileSize();
+    if (fst_size_ < 0) return Problem(fst_name_ + ": missing or unreadable");
+    run_.emplace(CColumnSet::FromGeneralFlags(header.GeneralFlags));
+    positions_ = (header.GeneralFlags & 2) != 0;
+    const int64_t blocks = findex_.BlockCount();
+    if (header.BlockNum < 2) {
       // A findex without words: the header alone, no postings.
       if (fst_size_ != 0) Problem(fst_name_ + ": holds " + std::to_string(fst_size_) +
                                   " bytes, but the findex has no words");
       return;
     }
-    if (blocks < header_.BlockNum) {
+    if (blocks < header.BlockNum) {
       Problem(sdx_name_ + ": truncated: " + std::to_string(blocks) + " blocks of the " +
-              std::to_string(header_.BlockNum) + " the header counts");
-    } else if (blocks > header_.BlockNum) {
-      Problem(sdx_name_ + ": " + std::to_string(blocks - header_.BlockNum) +
-              " blocks past the " + std::to_string(header_.BlockNum) + " the header counts");
+              std::to_string(header.BlockNum) + " the header counts");
+    } else if (blocks > header.BlockNum) {
+      Problem(sdx_name_ + ": " + std::to_string(blocks - header.BlockNum) +
+              " blocks past the " + std::to_string(header.BlockNum) + " the header counts");
     }
-    const int32_t usable = static_cast<int32_t>(std::min<int64_t>(blocks, header_.BlockNum));
+    const int32_t usable = static_cast<int32_t>(std::min<int64_t>(blocks, header.BlockNum));
     visited_.assign(static_cast<std::size_t>(std::max(usable, 0)), false);
     if (usable > kRootBlock) {
       visited_[kRootBlock] = true;
@@ -95,9 +93,9 @@ class PairCheck {
       Problem(fst_name_ + ": " + std::to_string(fst_size_ - fst_cursor_) +
               " bytes after the last posting list");
     }
-    if (problems_.size() == problems_at_start_ && words_ != header_.DistinctWordCount) {
+    if (problems_.size() == problems_at_start_ && words_ != header.DistinctWordCount) {
       Problem(sdx_name_ + ": " + std::to_string(words_) + " leaf rows, but the header counts " +
-              std::to_string(header_.DistinctWordCount) + " distinct words");
+              std::to_string(header.DistinctWordCount) + " distinct words");
     }
   }
 
@@ -112,33 +110,21 @@ class PairCheck {
     return sdx_name_ + " block " + std::to_string(block) + " (" + LevelName(level) + ")";
   }
 
-  bool OpenPostings() {
-    fst_ = platform::OpenFile(paths_.fst, O_RDONLY);
-    if (!fst_.IsOpen()) {
-      Problem(fst_name_ + ": missing or unreadable");
+  // Reads a block of the walk's level (1 root .. 4 leaf); false (after the
+  // problem) when it does not read.
+  bool Read(int32_t number, int level) {
+    try {
+      findex_.ReadTreeBlock(level - 1, number);
+    } catch (const CExceptionBase& e) {
+      Problem(Place(number, level) + ": does not read: " + DamageText(e));
       return false;
     }
-    fst_size_ = platform::FileSize(fst_.Get());
-    const CColumnSet columns = CColumnSet::FromGeneralFlags(header_.GeneralFlags);
-    width_ = columns.Width();
-    positions_ = (header_.GeneralFlags & 2) != 0;
     return true;
   }
 
-  std::optional<CBlock> Read(int32_t number, int level) {
-    CBlock block(CFindexTreeWriter::kBlockUnits);
-    try {
-      sdx_.SeekToBlock(number);
-      sdx_.ReadBlock(block);
-    } catch (const CExceptionBase& e) {
-      Problem(Place(number, level) + ": does not read: " + DamageText(e));
-      return std::nullopt;
-    }
-    return block;
-  }
-
   // Whether value lies within (low, high]: the values a child holds.
-  static bool Within(const CValue& value, const std::optional<CValue>& low,
+  template <class Value>
+  static bool Within(const Value& value, const std::optional<CValue>& low,
                      const std::optional<CValue>& high) {
     if (low && value.Compare(*low) == -1) return false;
     if (low && value.Compare(*low) == 0) return false;
@@ -165,25 +151,18 @@ class PairCheck {
 
   void Node(int32_t number, int level, const std::optional<CValue>& low,
             const std::optional<CValue>& high) {
-    if (Full()) return;
-    std::optional<CBlock> block = Read(number, level);
-    if (!block) return;
-    const auto type = static_cast<VALUE_TYPE>(header_.FindexType);
-    std::vector<int32_t> children;
-    std::vector<CValue> separators;
+    if (Full() || !Read(number, level)) return;
+    CGiFIndex::Node node;
     try {
-      children.push_back(block->ReadInt());
-      while (!block->AtEnd()) {
-        CValue separator(type);
-        block->ReadValue(separator);
-        separators.push_back(std::move(separator));
-        if (block->AtEnd()) break;
-        children.push_back(block->ReadInt());
-      }
+      node = findex_.ReadNode(level - 1, number);
     } catch (const CExceptionBase& e) {
       Problem(Place(number, level) + ": does not decode: " + DamageText(e));
       return;
     }
+    if (node.children.empty()) {
+      return Problem(Place(number, level) + ": does not decode: the node holds no entries");
+    }
+    const std::vector<CValue>& separators = node.separators;
     for (std::size_t i = 0; i < separators.size(); ++i) {
       if (!Within(separators[i], low, high) && !(i + 1 == separators.size() && high &&
                                                  separators[i].Compare(*high) == 0)) {
@@ -194,11 +173,11 @@ class PairCheck {
         Problem(Place(number, level) + ": separators out of order at " + std::to_string(i + 1));
       }
     }
-    for (std::size_t i = 0; i < children.size() && !Full(); ++i) {
+    for (std::size_t i = 0; i < node.children.size() && !Full(); ++i) {
       const std::optional<CValue> child_low = i == 0 ? low : std::optional<CValue>(separators[i - 1]);
       const std::optional<CValue> child_high =
           i < separators.size() ? std::optional<CValue>(separators[i]) : high;
-      const int32_t child = children[i];
+      const int32_t child = node.children[i];
       // Past the last separator: the empty end leaf, at any level.
       const bool trailing = i == separators.size();
       if (!Claim(number, level, child)) continue;
@@ -213,25 +192,28 @@ class PairCheck {
   }
 
   void EndLeaf(int32_t number, int32_t parent, int level) {
-    std::optional<CBlock> block = Read(number, kLeafLevel);
-    if (!block) return;
+    if (!Read(number, kLeafLevel)) return;
     if (end_leaf_ != 0 && end_leaf_ != number) {
       Problem(Place(parent, level) + ": ends in block " + std::to_string(number) +
               ", where the other levels end in block " + std::to_string(end_leaf_));
     }
     end_leaf_ = number;
-    if (block->GetUsed() != CBlock::kHeaderBytes) {
-      Problem(Place(number, kLeafLevel) + ": the end leaf is not empty");
+    bool empty = true;
+    try {
+      empty = findex_.ReadLeafRows(number, [](const CGiFIndex::LeafRow&) { return false; });
+    } catch (const CExceptionBase&) {
+      empty = false;
     }
+    if (!empty) Problem(Place(number, kLeafLevel) + ": the end leaf is not empty");
   }
 
   void Leaf(int32_t number, const std::optional<CValue>& low, const std::optional<CValue>& high) {
-    std::optional<CBlock> block = Read(number, kLeafLevel);
-    if (!block) return;
+    if (!Read(number, kLeafLevel)) return;
     // The chain: this leaf follows the one before it in tree order.
-    if (block->GetLinkWord2() != last_leaf_) {
+    const CGiFIndex::LeafLinks links = findex_.ReadLeafLinks(number);
+    if (links.previous != last_leaf_) {
       Problem(Place(number, kLeafLevel) + ": links back to block " +
-              std::to_string(block->GetLinkWord2()) + ", but follows block " +
+              std::to_string(links.previous) + ", but follows block " +
               std::to_string(last_leaf_));
     }
     if (last_leaf_ != 0 && last_leaf_next_ != number) {
@@ -240,40 +222,38 @@ class PairCheck {
               " follows it");
     }
     last_leaf_ = number;
-    last_leaf_next_ = block->GetLinkWord1();
-    const auto type = static_cast<VALUE_TYPE>(header_.FindexType);
+    last_leaf_next_ = links.next;
     int32_t row = 0;
     try {
-      while (!block->AtEnd() && !Full()) {
+      findex_.ReadLeafRows(number, [&](const CGiFIndex::LeafRow& leaf_row) {
         ++row;
-        CValue value(type);
-        block->ReadValue(value);
-        const int32_t position = block->ReadInt();
-        if (!Within(value, low, high)) {
+        if (!Within(leaf_row.value, low, high)) {
           Problem(Place(number, kLeafLevel) + ": row " + std::to_string(row) +
                   " lies outside the range of its parent");
         }
-        if (previous_ && value.Compare(*previous_) != 1 && value.Compare(*previous_) != 10) {
+        if (previous_ && leaf_row.value.Compare(*previous_) != 1 &&
+            leaf_row.value.Compare(*previous_) != kNotComparable) {
           Problem(Place(number, kLeafLevel) + ": row " + std::to_string(row) +
                   " is not above the value before it");
         }
-        previous_ = std::move(value);
+        leaf_row.value.CopyTo(previous_.emplace());
         ++words_;
-        Postings(number, row, position);
-      }
+        Postings(number, row, leaf_row.position);
+        return !Full();
+      });
     } catch (const CExceptionBase& e) {
-      Problem(Place(number, kLeafLevel) + ": row " + std::to_string(row) +
+      Problem(Place(number, kLeafLevel) + ": row " + std::to_string(row + 1) +
               " does not decode: " + DamageText(e));
     }
     if (row == 0) Problem(Place(number, kLeafLevel) + ": holds no rows");
   }
 
   // The posting list of a leaf row at position of the .fst.
-  void Postings(int32_t block, int32_t row, int32_t position) {
+  void Postings(int32_t block, int32_t row, int64_t position) {
     const std::string place = fst_name_ + " list of " + sdx_name_ + " block " +
                               std::to_string(block) + " row " + std::to_string(row) +
                               " at byte " + std::to_string(position);
-    const int64_t row_bytes = 4 * static_cast<int64_t>(width_);
+    const int64_t row_bytes = run_->RowSize();
     if (position < 0 || position + row_bytes > fst_size_) {
       fst_cursor_ = fst_size_;
       return Problem(place + ": the count row lies past the end of the file (" +
@@ -283,9 +263,12 @@ class PairCheck {
       Problem(place + ": the lists are not back to back (the one before ends at byte " +
               std::to_string(fst_cursor_) + ")");
     }
-    std::vector<uint8_t> count_row(static_cast<std::size_t>(row_bytes));
-    if (!ReadAt(position, count_row)) return Problem(place + ": does not read");
-    const int32_t count = bytes::LoadI32(count_row.data());
+    int32_t count = 0;
+    try {
+      count = findex_.RunRows(position);
+    } catch (const CExceptionBase& e) {
+      return Problem(place + ": does not read: " + DamageText(e));
+    }
     const int64_t end = position + row_bytes * std::max<int64_t>(count, 1);
     if (count < 2) {
       fst_cursor_ = position + row_bytes;
@@ -299,36 +282,34 @@ class PairCheck {
                      " bytes)");
     }
     fst_cursor_ = end;
-    std::vector<uint8_t> postings(static_cast<std::size_t>(row_bytes * (count - 1)));
-    if (!ReadAt(position + row_bytes, postings)) return Problem(place + ": does not read");
-    for (int32_t i = 1; i < count - 1; ++i) {
-      const int32_t before = bytes::LoadI32(postings.data() + row_bytes * (i - 1));
-      const int32_t key = bytes::LoadI32(postings.data() + row_bytes * i);
+    CItems& run = *run_;
+    try {
+      bool truncated = false;
+      findex_.ReadItems(run, position, end, 0, truncated);
+    } catch (const CExceptionBase& e) {
+      return Problem(place + ": does not read: " + DamageText(e));
+    }
+    for (int32_t i = 2; i < run.Count(); ++i) {
+      const int32_t before = run.Key(i - 1);
+      const int32_t key = run.Key(i);
       // Positions repeat a key; without them each key is one posting.
       if (key < before || (!positions_ && key == before)) {
-        return Problem(place + ": keys out of order at posting " + std::to_string(i + 1) +
+        return Problem(place + ": keys out of order at posting " + std::to_string(i) +
                        " (key " + std::to_string(key) + " after " + std::to_string(before) + ")");
       }
     }
   }
 
-  bool ReadAt(int64_t position, std::vector<uint8_t>& out) {
-    return platform::SeekFile(fst_.Get(), position, platform::SeekFrom::Begin) == position &&
-           platform::ReadFull(fst_.Get(), out.data(), out.size()) ==
-               static_cast<ssize_t>(out.size());
-  }
-
-  const findex::FilePaths& paths_;
+  std::string name_;
+  findex::FilePaths paths_;
   std::vector<std::string>& problems_;
   std::size_t problems_at_start_;
   std::string sdx_name_;
   std::string fst_name_;
-  BFile sdx_;
-  CIndexHeader header_;
-  platform::FileHandle fst_;
+  CGiFIndex findex_;
+  std::optional<CItems> run_;  // the rows of one posting list, count row first
   int64_t fst_size_ = 0;
   int64_t fst_cursor_ = 0;
-  int32_t width_ = 1;
   bool positions_ = false;
   std::vector<bool> visited_;
   int32_t end_leaf_ = 0;
@@ -340,22 +321,16 @@ class PairCheck {
 
 }  // namespace
 
-std::vector<std::string> CheckFindexPair(const std::string& sdx_path, const std::string& fst_path) {
-  std::vector<std::string> problems;
-  const findex::FilePaths paths{sdx_path, fst_path, {}};
-  PairCheck(paths, problems).Run();
-  return problems;
-}
-
 std::vector<std::string> CheckFindexFiles(const CGlobalDefs& defs, std::string_view name) {
   std::vector<std::string> problems;
   CLockManager lock(defs.GetLockScope(), defs.GetGroup(), findex::OwnerName(name), kLockFindex);
   lock.LockReader();
-  PairCheck(findex::PathsOf(defs, name), problems).Run();
+  PairCheck(defs, name, problems).Run();
   for (int32_t n = 1; problems.size() < kMostProblems; ++n) {
-    const findex::FilePaths add_on = findex::PathsOf(defs, findex::AddOnName(name, n));
-    if (!platform::FileExists(add_on.sdx) && !platform::FileExists(add_on.fst)) break;
-    PairCheck(add_on, problems).Run();
+    const std::string add_on = findex::AddOnName(name, n);
+    const findex::FilePaths paths = findex::PathsOf(defs, add_on);
+    if (!platform::FileExists(paths.sdx) && !platform::FileExists(paths.fst)) break;
+    PairCheck(defs, add_on, problems).Run();
   }
   const std::string del = findex::PathsOf(defs, name).del;
   if (problems.size() < kMostProblems && platform::FileExists(del)) {

@@ -1,6 +1,6 @@
 // Walking the files of a findex to find damage: what `quillmere check`
-// reports. The walk reads what a search reads, through the block and header
-// readers of the file format, and checks every rule the writer keeps.
+// reports. The walk reads through CGiFIndex, piece by piece, exactly what
+// lookups read, and checks every rule the writer keeps.
 #pragma once
 
 #include <string>
@@ -21,8 +21,5 @@ class CGlobalDefs;
 // sound list. Reads under a reader unit of the findex's kind 2 lock.
 // REQUIRES: some file of the findex exists.
 std::vector<std::string> CheckFindexFiles(const CGlobalDefs& defs, std::string_view name);
-
-// The same walk of one pair of files, without locks, add-ons or deleted keys.
-std::vector<std::string> CheckFindexPair(const std::string& sdx_path, const std::string& fst_path);
 
 }  // namespace qm

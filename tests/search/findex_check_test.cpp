@@ -11,9 +11,9 @@
 #include "base/byte_layout.h"
 #include "config/global_defs.h"
 #include "format/mfile.h"
-#include "index/findex_check.h"
 #include "index/findex_files_writer.h"
 #include "platform/file_io.h"
+#include "search/findex_check.h"
 #include "support/findex_decoder.h"
 #include "support/test_support.h"
 
@@ -93,6 +93,14 @@ TEST_F(FindexCheckTest, FindsEachKindOfDamageAndItsPlace) {
        "BOOKS.sdx block 3 (node, level 3)"},
       {"broken leaf chain", [this] { Patch(Sdx(), 4 * kBlock + 2, std::string("\x09\x00", 2)); },
        "BOOKS.sdx block 4 (leaf): links on to block 9, but block 5 follows it"},
+      {"random bytes in the postings",
+       [this] {
+         std::mt19937 random(11);
+         std::string noise(64, '\0');
+         for (char& c : noise) c = static_cast<char>(random());
+         Patch(Fst(), 0, noise);
+       },
+       "BOOKS.fst list of BOOKS.sdx block 4 row 1 at byte 0: "},
       {"count row past the end", [this] { Cut(Fst(), 8 * 4 * 2 + 4); },
        "the count row lies past the end of the file"},
       {"postings past the end", [this] { Patch(Fst(), 0, Int32(1000)); },

@@ -14,9 +14,9 @@
 // (maximum resident set) and CPU time are its own. --phases builds the same
 // findex once more from its two halves, the word sort (CPiSort) and the
 // writer (CPiFIndex::BuildFromSorted), to time its phases: the row loop (rows
-// read, split and handed to the sorting thread, which sorts and writes runs
-// beside it), the k-way merge after the row loop, the writer, and closing the
-// sorted file. The sort's memory budget is sort_memory_mb of the
+// read, their text split on the splitting thread and handed to the sorting
+// thread, which sorts and writes runs beside it), the k-way merge after the
+// row loop, the writer, and closing the sorted file. The sort's memory budget is sort_memory_mb of the
 // configuration store (MORVIL_SORT_MEMORY_MB).
 #include <sqlite3.h>
 #include <sys/resource.h>

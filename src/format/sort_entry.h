@@ -45,19 +45,24 @@ inline uint64_t BigEndian64(const uint8_t* p) {
 // Each comparison also gives a prefix of an entry: a number that never
 // orders two entries against their comparison (a <= b gives Prefix(a) <=
 // Prefix(b)), so a sort can compare prefixes and look at the entries only
-// when they are equal.
+// when they are equal. WholeValue(prefix) tells that entries sharing that
+// prefix have equal values, so their keys decide without the entries.
 
 struct Narrow {
   std::size_t row_bytes;
-  // The first eight bytes, zero-padded.
+  // The first seven bytes, zero-padded, then the length up to 8: a shorter
+  // text that the padding matches comes first, as in the comparison, and an
+  // equal prefix under 8 in its last byte holds the whole text.
   uint64_t Prefix(const uint8_t* e) const {
     const std::size_t n = bytes::LoadU16(e + row_bytes) & 0x7FFF;
     const uint8_t* p = e + row_bytes + 2;
-    if (n >= 8) return BigEndian64(p);
+    if (n >= 8) return (BigEndian64(p) & ~uint64_t{0xFF}) | 8;
     uint64_t v = 0;
-    for (std::size_t i = 0; i < 8; ++i) v = (v << 8) | (i < n ? p[i] : 0);
-    return v;
+    for (std::size_t i = 0; i < 7; ++i) v = (v << 8) | (i < n ? p[i] : 0);
+    return (v << 8) | n;
   }
+  // Whether entries with this same prefix have equal values.
+  static bool WholeValue(uint64_t prefix) { return (prefix & 0xFF) < 8; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
     const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
@@ -80,14 +85,16 @@ struct Narrow {
 
 struct Wide {
   std::size_t row_bytes;
-  // The first four units, zero-padded.
+  // The first three units, zero-padded, then the length up to 4 (as for
+  // narrow text).
   uint64_t Prefix(const uint8_t* e) const {
     const std::size_t n = bytes::LoadU16(e + row_bytes) & 0x7FFF;
     const uint8_t* p = e + row_bytes + 2;
     uint64_t v = 0;
-    for (std::size_t i = 0; i < 4; ++i) v = (v << 16) | (i < n ? bytes::LoadU16(p + 2 * i) : 0);
-    return v;
+    for (std::size_t i = 0; i < 3; ++i) v = (v << 16) | (i < n ? bytes::LoadU16(p + 2 * i) : 0);
+    return (v << 16) | (n < 4 ? n : 4);
   }
+  static bool WholeValue(uint64_t prefix) { return (prefix & 0xFFFF) < 4; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const std::size_t na = bytes::LoadU16(a + row_bytes) & 0x7FFF;
     const std::size_t nb = bytes::LoadU16(b + row_bytes) & 0x7FFF;
@@ -112,6 +119,7 @@ struct Integer {
     const uint32_t key = bytes::LoadU32(e) ^ 0x80000000u;
     return (uint64_t{value} << 32) | key;
   }
+  static bool WholeValue(uint64_t) { return true; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const int c = Order(bytes::LoadI32(a + row_bytes), bytes::LoadI32(b + row_bytes));
     return c != 0 ? c : Keys(a, b);
@@ -123,6 +131,7 @@ struct Integer {
 struct Double {
   std::size_t row_bytes;
   uint64_t Prefix(const uint8_t*) const { return 0; }
+  static bool WholeValue(uint64_t) { return false; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const double x = bytes::LoadDouble(a + row_bytes);
     const double y = bytes::LoadDouble(b + row_bytes);
@@ -140,6 +149,7 @@ struct Double {
 struct Date {
   std::size_t row_bytes;
   uint64_t Prefix(const uint8_t*) const { return 0; }
+  static bool WholeValue(uint64_t) { return false; }
   int operator()(const uint8_t* a, const uint8_t* b) const {
     const uint8_t* va = a + row_bytes;
     const uint8_t* vb = b + row_bytes;

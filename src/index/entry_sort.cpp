@@ -1,11 +1,13 @@
 #include "index/entry_sort.h"
 
 #include <algorithm>
+#include <array>
 #include <chrono>
 #include <cstring>
 #include <new>
 #include <string>
 
+#include "base/byte_layout.h"
 #include "base/checked_allocation.h"
 #include "base/error_numbers.h"
 #include "base/exception_family.h"
@@ -24,8 +26,13 @@ namespace {
 constexpr int64_t kProgressStep = 4096;
 // Room for several of the longest entries a layout can hold (64 KB each).
 constexpr std::size_t kLeastBufferBytes = 256 * 1024;
-// A run buffer is sorted in about this many pieces as it fills.
+// Slots hold 32-bit offsets into the run buffer.
+constexpr std::size_t kMostBufferBytes = std::size_t{0xFFFFFFFF};
+// A run buffer is sorted in about this many pieces as it fills, each at most
+// 16 MB: few pieces keep the merge narrow, and the last one, sorted after the
+// rows end, short.
 constexpr std::size_t kPiecesPerBuffer = 16;
+constexpr std::size_t kMostPieceBytes = 16 * 1024 * 1024;
 
 using Clock = std::chrono::steady_clock;
 
@@ -45,7 +52,8 @@ CEntrySort::CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module,
       layout_(layout),
       module_(module),
       // Whole slots, and room for the longest entry a layout can hold.
-      buffer_bytes_(std::max(memory_bytes, kLeastBufferBytes) / sizeof(Slot) * sizeof(Slot)),
+      buffer_bytes_(std::clamp(memory_bytes, kLeastBufferBytes, kMostBufferBytes) / sizeof(Slot) *
+                    sizeof(Slot)),
       merge_ways_(std::max<std::size_t>(merge_ways, 2)) {}
 
 CEntrySort::CEntrySort(CGlobalDefs& defs, SortEntryLayout layout, Module module)
@@ -96,7 +104,7 @@ void CEntrySort::Add(const uint8_t* entry, std::size_t size) {
   if (fill_ + size + (slots_ + 1) * sizeof(Slot) > buffer_bytes_) SpillRun();
   std::memcpy(buffer_.get() + fill_, entry, size);
   ++slots_;
-  *SlotsBegin() = Slot{0, fill_};
+  *SlotsBegin() = Slot{0, static_cast<uint32_t>(fill_), 0};
   fill_ += size;
   ++entries_;
   // Pieces are sorted as they fill, while the rows are still being read; the
@@ -105,7 +113,7 @@ void CEntrySort::Add(const uint8_t* entry, std::size_t size) {
 }
 
 std::size_t CEntrySort::PieceBytes() const {
-  return std::max(buffer_bytes_ / kPiecesPerBuffer, kLeastBufferBytes / 4);
+  return std::clamp(buffer_bytes_ / kPiecesPerBuffer, kLeastBufferBytes / 4, kMostPieceBytes);
 }
 
 void CEntrySort::AddEntries(const uint8_t* entries, std::size_t bytes) {
@@ -122,23 +130,75 @@ CEntrySort::Slot* CEntrySort::SlotAt(std::size_t index) const {
                                               (index + 1) * sizeof(Slot)));
 }
 
+void CEntrySort::RadixSortByPrefix(Slot* begin, Slot* end) {
+  const auto n = static_cast<std::size_t>(end - begin);
+  if (n < 2) return;
+  // One count per byte value of each of the prefix's eight bytes, the
+  // lowest first; a byte that is the same in every slot needs no pass.
+  std::array<std::array<uint32_t, 256>, 8> counts{};
+  for (const Slot* s = begin; s != end; ++s) {
+    for (std::size_t b = 0; b < 8; ++b) ++counts[b][(s->prefix >> (8 * b)) & 0xFF];
+  }
+  radix_scratch_.resize(n);
+  Slot* from = begin;
+  Slot* to = radix_scratch_.data();
+  for (std::size_t b = 0; b < 8; ++b) {
+    std::array<uint32_t, 256>& count = counts[b];
+    const unsigned shift = static_cast<unsigned>(8 * b);
+    if (count[(from->prefix >> shift) & 0xFF] == n) continue;
+    uint32_t sum = 0;
+    for (uint32_t& c : count) {
+      const uint32_t here = c;
+      c = sum;
+      sum += here;
+    }
+    for (std::size_t i = 0; i < n; ++i) to[count[(from[i].prefix >> shift) & 0xFF]++] = from[i];
+    std::swap(from, to);
+  }
+  if (from != begin) std::copy(from, from + n, begin);
+}
+
 void CEntrySort::SortPiece() {
   const std::size_t first = pieces_.empty() ? 0 : pieces_.back();
   if (slots_ == first) return;
   const Clock::time_point start = Clock::now();
   const auto* base = reinterpret_cast<const uint8_t*>(buffer_.get());
-  // Slots first..slots_ - 1 lie from SlotAt(slots_ - 1) upwards.
+  // Slots first..slots_ - 1 lie from SlotAt(slots_ - 1) upwards, the last
+  // added lowest: reversed, they stand in the order added.
   Slot* begin = SlotAt(slots_ - 1);
   Slot* end = begin + (slots_ - first);
-  layout_.WithComparison([&](auto compare) {
-    for (Slot* s = begin; s != end; ++s) s->prefix = compare.Prefix(base + s->offset);
-    // Equal entries by offset, that is in the order they were added.
-    std::sort(begin, end, [&](const Slot& a, const Slot& b) {
-      if (a.prefix != b.prefix) return a.prefix < b.prefix;
-      const int c = compare(base + a.offset, base + b.offset);
-      return c != 0 ? c < 0 : a.offset < b.offset;
+  std::reverse(begin, end);
+  try {
+    layout_.WithComparison([&](auto compare) {
+      for (Slot* s = begin; s != end; ++s) {
+        s->prefix = compare.Prefix(base + s->offset);
+        s->key = bytes::LoadI32(base + s->offset);  // the row's first item
+      }
+      // By prefix, equal ones still in the order added; then each group of
+      // equal prefixes by key when the prefix holds the whole value, else by
+      // entry; equal entries by offset, that is in the order they were added.
+      RadixSortByPrefix(begin, end);
+      const auto by_key = [](const Slot& a, const Slot& b) { return a.key < b.key; };
+      const auto by_entry = [&](const Slot& a, const Slot& b) {
+        const int c = compare(base + a.offset, base + b.offset);
+        return c != 0 ? c < 0 : a.offset < b.offset;
+      };
+      for (Slot* group = begin; group != end;) {
+        Slot* after = group + 1;
+        while (after != end && after->prefix == group->prefix) ++after;
+        if (after - group > 1) {
+          if (!compare.WholeValue(group->prefix)) {
+            std::sort(group, after, by_entry);
+          } else if (!std::is_sorted(group, after, by_key)) {
+            std::stable_sort(group, after, by_key);
+          }
+        }
+        group = after;
+      }
     });
-  });
+  } catch (const std::bad_alloc&) {
+    RaiseAllocationFailure();
+  }
   pieces_.push_back(slots_);
   piece_fill_ = fill_;
   if (entries_ - traced_ >= kSortedTraceStep) {
@@ -190,26 +250,62 @@ class CEntrySort::Merger {
     writer.Start(out);
     int64_t bytes = 0;
     sort_.layout_.WithComparison([&](auto compare) {
+      // Whether input a's entry comes after input b's. The prefixes settle
+      // most comparisons (a piece's come with its slots); equal ones that
+      // hold whole values leave it to the keys.
       const auto after = [&](int a, int b) {
-        const int c = compare(inputs_[a].entry, inputs_[b].entry);
-        return c != 0 ? c > 0 : a > b;
+        const Input& x = inputs_[static_cast<std::size_t>(a)];
+        const Input& y = inputs_[static_cast<std::size_t>(b)];
+        if (x.prefix != y.prefix) return x.prefix > y.prefix;
+        if (compare.WholeValue(x.prefix)) {
+          if (x.key != y.key) return x.key > y.key;
+        } else {
+          const int c = compare(x.entry, y.entry);
+          if (c != 0) return c > 0;
+        }
+        return a > b;
       };
+      const auto next = [&](int i) {
+        if (!Next(i)) return false;
+        Input& in = inputs_[static_cast<std::size_t>(i)];
+        if (in.slot_end != nullptr) {
+          in.prefix = in.slot[-1].prefix;
+          in.key = in.slot[-1].key;
+        } else {
+          in.prefix = compare.Prefix(in.entry);
+          in.key = bytes::LoadI32(in.entry);
+        }
+        return true;
+      };
+      // A heap of inputs, the smallest entry on top; the top is replaced
+      // and sifted down, one pass for each entry written.
       std::vector<int> heap;
       heap.reserve(inputs_.size());
+      const auto sift_down = [&](std::size_t at) {
+        const std::size_t n = heap.size();
+        for (;;) {
+          std::size_t child = 2 * at + 1;
+          if (child >= n) return;
+          if (child + 1 < n && after(heap[child], heap[child + 1])) ++child;
+          if (!after(heap[at], heap[child])) return;
+          std::swap(heap[at], heap[child]);
+          at = child;
+        }
+      };
       for (int i = 0; i < static_cast<int>(inputs_.size()); ++i) {
-        if (Next(i)) heap.push_back(i);
+        if (next(i)) heap.push_back(i);
       }
-      std::make_heap(heap.begin(), heap.end(), after);
+      for (std::size_t at = heap.size() / 2; at-- > 0;) sift_down(at);
       while (!heap.empty()) {
-        std::pop_heap(heap.begin(), heap.end(), after);
-        const int i = heap.back();
-        writer.Put(inputs_[i].entry, inputs_[i].size);
-        bytes += static_cast<int64_t>(inputs_[i].size);
-        if (Next(i)) {
-          std::push_heap(heap.begin(), heap.end(), after);
-        } else {
+        const int i = heap.front();
+        writer.Put(inputs_[static_cast<std::size_t>(i)].entry,
+                   inputs_[static_cast<std::size_t>(i)].size);
+        bytes += static_cast<int64_t>(inputs_[static_cast<std::size_t>(i)].size);
+        if (!next(i)) {
+          heap.front() = heap.back();
           heap.pop_back();
         }
+        if (!heap.empty()) sift_down(0);
         if (++merged_ % kProgressStep == 0 && work_ > 0) ShowProgress();
       }
     });
@@ -225,6 +321,8 @@ class CEntrySort::Merger {
     const Slot* slot_end = nullptr;
     const uint8_t* entry = nullptr;
     std::size_t size = 0;
+    uint64_t prefix = 0;  // the entry's comparison prefix and key
+    int32_t key = 0;
   };
 
   bool Next(int i) {
@@ -308,6 +406,7 @@ void CEntrySort::Merge(MFile& sorted) {
   ++passes_;
   Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i", int64_t{1});
   buffer_.reset();
+  radix_scratch_ = std::vector<Slot>();
   ClearBuffer();
   run_file_.Close();
   runs_in_file_.clear();

@@ -85,9 +85,13 @@ class CEntrySort {
  private:
   // An entry of the buffer: its comparison prefix and its offset. Slots fill
   // the buffer from its end downwards while entries fill it from its start.
+  // The key is kept beside the prefix: equal words (the most frequent tie)
+  // are then ordered without reading their entries. Offsets are 32-bit, so a
+  // run buffer holds at most 4 GB.
   struct Slot {
     uint64_t prefix;
-    uint64_t offset;
+    uint32_t offset;
+    int32_t key;
   };
   struct Run {
     int64_t begin;
@@ -110,6 +114,8 @@ class CEntrySort {
   std::size_t PieceBytes() const;
   // Sorts the slots added since the last piece by entry, then offset.
   void SortPiece();
+  // Orders slots by prefix, keeping the order of equal ones.
+  void RadixSortByPrefix(Slot* begin, Slot* end);
   // Every piece of the buffer, sorted, the earliest first.
   std::vector<SlotRange> SortedPieces();
   // Merges the pieces of the buffer into one run of the run file.
@@ -127,6 +133,7 @@ class CEntrySort {
   std::size_t fill_ = 0;   // entry bytes at the start of buffer_
   std::size_t slots_ = 0;  // slots at the end of buffer_
   std::vector<std::size_t> pieces_;  // the slot counts at which pieces end
+  std::vector<Slot> radix_scratch_;   // the other half of the prefix radix sort
   std::size_t piece_fill_ = 0;       // fill_ when the last piece ended
   MFile run_file_;
   std::vector<Run> runs_in_file_;

@@ -15,6 +15,8 @@
 #include "index/document_column.h"
 #include "index/entry_sort.h"
 #include "index/entry_block_queue.h"
+#include "index/entry_writer.h"
+#include "index/word_splitting_thread.h"
 #include "config/megabyte_setting.h"
 #include "format/findex_type.h"
 #include "index/row_keys.h"
@@ -96,47 +98,6 @@ struct RowPlan {
   }
 };
 
-// The row loop's writer of entries: the item row of the current row and
-// column, one value after it, handed to the sorting thread's queue.
-class EntryWriter {
- public:
-  EntryWriter(EntryBlockQueue& queue, const SortEntryLayout& layout, const CColumnSet& set)
-      : queue_(queue), layout_(layout), row_(static_cast<std::size_t>(set.Width()), 0),
-        score_column_(set.s != 0 ? set.ScoreColumn() : -1),
-        position_column_(set.p != 0 ? set.PositionColumn() : -1) {}
-
-  void SetKey(int32_t key) { row_[0] = key; }
-  void SetWeight(int32_t weight) {
-    if (score_column_ >= 0) row_[static_cast<std::size_t>(score_column_)] = weight;
-  }
-  void SetPosition(int32_t position) {
-    if (position_column_ >= 0) row_[static_cast<std::size_t>(position_column_)] = position;
-  }
-
-  template <class Append>
-  void Write(Append&& append_value) {
-    entry_.clear();
-    SortEntryLayout::AppendRow(entry_, row_);
-    append_value(entry_);
-    queue_.Put(entry_.data(), entry_.size());
-    ++entries_;
-  }
-  void WriteText(std::u16string_view word) {
-    Write([&](std::vector<uint8_t>& out) { layout_.AppendText(out, word); });
-  }
-
-  int64_t Entries() const { return entries_; }
-
- private:
-  EntryBlockQueue& queue_;
-  const SortEntryLayout& layout_;
-  std::vector<int32_t> row_;
-  int32_t score_column_;
-  int32_t position_column_;
-  std::vector<uint8_t> entry_;
-  int64_t entries_ = 0;
-};
-
 // Progress from 5 to 15 by rows read, in steps of at least 1%, when the
 // driver knows how many rows come.
 class RowProgress {
@@ -189,9 +150,17 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
   const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
   const SortEntryLayout layout(set.Width(), type);
   sorting.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted, method_);
-  EntryWriter writer(sorting->Queue(), layout, set);
-  std::optional<CWordPipeline> pipeline;
-  if (IsText(type)) pipeline.emplace(defs_, WordPipelineOptions::FromHeader(definition));
+  // Text is split on a thread of its own; other values are written here.
+  std::optional<WordSplittingThread> splitting;
+  std::optional<EntryWriter> writer;
+  if (IsText(type)) {
+    std::vector<int32_t> weights;
+    for (const IndexedColumn& column : plan.columns) weights.push_back(column.weight);
+    splitting.emplace(defs_, WordPipelineOptions::FromHeader(definition), sorting->Queue(), layout,
+                      set, std::move(weights));
+  } else {
+    writer.emplace(sorting->Queue(), layout, set);
+  }
   DocumentTexts documents(defs_);
   // Indexed text is read whole: a word anywhere in a value must be found.
   const std::size_t text_limit = ConfiguredColumnTextBytes();
@@ -207,13 +176,6 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
   int64_t rows = 0;
   int64_t nulls = 0;
 
-  auto write_words = [&](const auto& text, int32_t& position) {
-    pipeline->WrittenWords(text, position, [&](const SplitWord& word) {
-      writer.SetPosition(word.position);
-      writer.WriteText(word.form);
-    });
-  };
-
   defs_.SetProgress(5);
   while (database.IsRowAvailable()) {
     Trace(defs_.TraceLevel3(), kRowsTag, "Caching columns");
@@ -228,14 +190,18 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
       break;
     }
     const int32_t key = keys.Read<CPiSortException>(database, kRowsMethod);
-    writer.SetKey(key);
+    if (splitting) {
+      splitting->StartRow(key);
+    } else {
+      writer->SetKey(key);
+    }
 
     int32_t position = 0;
     for (std::size_t i = 0; i < plan.columns.size(); ++i) {
       const IndexedColumn& column = plan.columns[i];
-      if (i > 0) ++position;
-      writer.SetWeight(column.weight);
       if (!IsText(type)) {
+        if (i > 0) ++position;
+        writer->SetWeight(column.weight);
         if (database.GetColumnValueFromCache(column.index, type, value) ==
                 CShareDatabase::kValueNull ||
             (type == VALUE_TYPE::Double && std::isnan(value.GetDouble()))) {
@@ -243,8 +209,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
           ++nulls;
           continue;
         }
-        writer.SetPosition(position);
-        writer.Write([&](std::vector<uint8_t>& out) {
+        writer->SetPosition(position);
+        writer->Write([&](std::vector<uint8_t>& out) {
           if (type == VALUE_TYPE::Integer) {
             SortEntryLayout::AppendInteger(out, value.GetInteger());
           } else if (type == VALUE_TYPE::Double) {
@@ -262,6 +228,7 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
                                        : (IsText(column.own_type) ? column.own_type : type);
       if (database.GetColumnValueFromCache(column.index, read_as, value) ==
           CShareDatabase::kValueNull) {
+        splitting->Null();
         ++nulls;
         continue;
       }
@@ -275,13 +242,14 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
       }
       if (column.document.IsDocument()) {
         document_text = documents.Text(column.document, value.Narrow(), column.binary);
-        write_words(std::string_view(document_text), position);
+        splitting->Narrow(document_text);
       } else if (read_as == VALUE_TYPE::UnicodeString) {
-        write_words(value.Wide(), position);
+        splitting->Wide(value.Wide());
       } else {
-        write_words(value.Narrow(), position);
+        splitting->Narrow(value.Narrow());
       }
     }
+    if (splitting) splitting->EndRow();
     database.CleanCacheColumns();
     ++rows;
     if (rows % kRowTraceStep == 0) Trace(defs_.TraceLevel1(), kRowsTag, "Reading row %i", rows);
@@ -289,8 +257,9 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
     if (database.MoveNext() != CShareDatabase::kRowFetched) break;
   }
 
+  const int64_t entries = splitting ? splitting->Finish() : writer->Entries();
   Trace(defs_.TraceLevel1(), kRowsTag, "End Status. Row Count %i, Word Count: %i, Null Count: %i",
-        rows, writer.Entries(), nulls);
+        rows, entries, nulls);
   definition.SortMax = keys.SortMax();
   definition.MaxDateTimeKey = keys.MaxDateTimeKey();
   definition.KeyCount =

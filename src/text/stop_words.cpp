@@ -15,6 +15,8 @@ StopWordList StopWordList::FromText(std::u16string_view text) {
     std::u16string word = ToUpper(token);
     word.resize(Utf16CutLength(word, kMaxWordLength));
     list.longest_ = std::max(list.longest_, word.size());
+    const std::size_t bit = FilterBit(word);
+    list.filter_[bit / 64] |= uint64_t{1} << (bit % 64);
     list.words_.insert(std::move(word));
   }
   return list;

@@ -2,6 +2,7 @@
 // up by exact comparison through a hash set.
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
@@ -21,8 +22,9 @@ class StopWordList {
 
   // `word` must already be upper case, as the word splitter delivers it.
   bool Contains(std::u16string_view word) const {
-    // Most words of a text are longer than any stop word: no lookup for them.
-    return word.size() <= longest_ && words_.find(word) != words_.end();
+    // Most words of a text are longer than any stop word, or miss the
+    // filter of the list's words: no lookup for them.
+    return word.size() <= longest_ && MayContain(word) && words_.find(word) != words_.end();
   }
   std::size_t Size() const { return words_.size(); }
 
@@ -40,6 +42,19 @@ class StopWordList {
       return static_cast<std::size_t>(h);
     }
   };
+  // One bit per value of a cheap hash of the length and the first and last
+  // units; every word of the list has its bit set.
+  static std::size_t FilterBit(std::u16string_view s) {
+    if (s.empty()) return 0;
+    return (s.size() * 0x9E37u ^ s.front() * 0x2F1u ^ s.back() * 0x61u) & (kFilterBits - 1);
+  }
+  bool MayContain(std::u16string_view s) const {
+    const std::size_t bit = FilterBit(s);
+    return (filter_[bit / 64] >> (bit % 64)) & 1u;
+  }
+
+  static constexpr std::size_t kFilterBits = 1 << 16;
+  std::array<uint64_t, kFilterBits / 64> filter_{};
   std::unordered_set<std::u16string, Hash, std::equal_to<>> words_;
   std::size_t longest_ = 0;  // units of the longest stop word
 };

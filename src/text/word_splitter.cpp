@@ -1,5 +1,8 @@
 #include "text/word_splitter.h"
 
+#include <cstdint>
+#include <cstring>
+
 #include "platform/text_encoding.h"
 #include "text/blank_trim.h"
 #include "text/remove_blocks.h"
@@ -8,12 +11,29 @@ namespace qm {
 
 namespace {
 
+// Upper-cases four units at p when all four are ASCII (false, untouched,
+// otherwise). In each 16-bit lane, adding 0x1F sets bit 7 from 'a' up and
+// adding 0x05 sets it from '{' up: the lanes holding 'a'..'z' lose 0x20.
+bool UpperCaseFourAscii(char16_t* p) {
+  uint64_t units;
+  std::memcpy(&units, p, sizeof units);
+  if ((units & 0xFF80FF80FF80FF80ull) != 0) return false;
+  const uint64_t from_a = units + 0x001F001F001F001Full;
+  const uint64_t past_z = units + 0x0005000500050005ull;
+  const uint64_t lower = from_a & ~past_z & 0x0080008000800080ull;
+  units -= lower >> 2;
+  std::memcpy(p, &units, sizeof units);
+  return true;
+}
+
 // Simple upper-case mapping per character; surrogate pairs are mapped as one
 // character and a character keeps its width in units, so the text's length
 // does not change.
 void UpperCaseInPlace(std::u16string& text) {
   const std::size_t n = text.size();
   for (std::size_t i = 0; i < n; ++i) {
+    while (i + 4 <= n && UpperCaseFourAscii(text.data() + i)) i += 4;
+    if (i >= n) break;
     const char16_t u = text[i];
     if (u < 0x80) {
       if (u >= u'a' && u <= u'z') text[i] = static_cast<char16_t>(u - 32);

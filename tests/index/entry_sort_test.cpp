@@ -31,16 +31,21 @@ void AppendRandomValue(const SortEntryLayout& layout, std::mt19937& random,
     case VALUE_TYPE::AsciiString: {
       // Bytes compare unsigned: "é" (C3 A9) sorts after "z". Long words
       // differ only past their first eight bytes.
-      static const char* const kWords[] = {"", "A", "AB", "z", "é", "éa", "ABCDEFGHIJ",
-                                           "ABCDEFGHIK", "ABCDEFGHé"};
-      layout.AppendText(out, std::string_view(kWords[pick(std::size(kWords))]));
+      // Around seven and eight bytes, and with zero bytes that the padding
+      // of a short word matches.
+      static const std::string_view kWords[] = {
+          "", "A", "AB", "z", "é", "éa", "ABCDEFGHIJ", "ABCDEFGHIK", "ABCDEFGHé",
+          "ABCDEFG", "ABCDEFGH", "ABCDEFGA", std::string_view("AB\0", 3),
+          std::string_view("ABCDEFG\0", 8), std::string_view("\0", 1)};
+      layout.AppendText(out, kWords[pick(std::size(kWords))]);
       return;
     }
     case VALUE_TYPE::UnicodeString: {
       // By code unit: a surrogate pair (D800...) sorts before U+FF61.
-      static const char16_t* const kWords[] = {u"", u"A", u"\uFF61", u"\U00010000", u"\u00E9",
-                                               u"ABCDE", u"ABCDF", u"ABCD\uFF61"};
-      layout.AppendText(out, std::u16string_view(kWords[pick(std::size(kWords))]));
+      static const std::u16string_view kWords[] = {
+          u"", u"A", u"\uFF61", u"\U00010000", u"\u00E9", u"ABCDE", u"ABCDF", u"ABCD\uFF61",
+          u"ABC", u"ABCD", std::u16string_view(u"AB\0", 3), std::u16string_view(u"ABC\0", 4)};
+      layout.AppendText(out, kWords[pick(std::size(kWords))]);
       return;
     }
     case VALUE_TYPE::Integer: {

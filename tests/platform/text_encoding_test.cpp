@@ -43,6 +43,28 @@ TEST(Utf8Utf16, ValidTextRoundTripsAndInvalidTextBecomesReplacement) {
   EXPECT_EQ(pos, 1u);
 }
 
+TEST(Utf8Utf16, AsciiRunsOfEveryLengthAroundOtherSequencesConvertAsCodePoints) {
+  // Runs of ASCII shorter and longer than eight bytes, with a sequence of
+  // every length (and an invalid byte) at every place, appended to text
+  // already there: the same as converting code point by code point.
+  const std::string others[] = {"\xC3\xA9", "\xE2\x82\xAC", "\xF0\x9F\x98\x80", "\xFF", "\xE2\x82"};
+  for (const std::string& other : others) {
+    for (std::size_t before = 0; before <= 17; ++before) {
+      for (std::size_t after = 0; after <= 9; after += 3) {
+        std::string text;
+        for (std::size_t i = 0; i < before; ++i) text += static_cast<char>('!' + i * 5 % 90);
+        text += other;
+        text += std::string(after, '~') + "\x7F";
+        std::u16string expected = u"kept";
+        for (std::size_t pos = 0; pos < text.size();) EncodeUtf16(DecodeUtf8(text, pos), expected);
+        std::u16string got = u"kept";
+        AppendUtf8AsUtf16(text, got);
+        EXPECT_EQ(got, expected) << before << " " << after;
+      }
+    }
+  }
+}
+
 TEST(CutLength, CutsNeverSplitACharacter) {
   const std::string text = "a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80";  // a é € 😀
   // Cut points inside a character fall back to its start.

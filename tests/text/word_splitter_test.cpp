@@ -80,6 +80,24 @@ class TestFilter : public CWordFilter {
   }
 };
 
+TEST(WordSplitter, UpperCaseAtEveryOffsetAndAroundTheLetterRanges) {
+  // The characters just outside 'a'..'z' and 'A'..'Z' stay; non-ASCII
+  // characters at every offset of an ASCII run are mapped one by one.
+  CWordSplitter splitter(CSeparatorSet(u" "), false);
+  const std::u16string edges = u"@AZ[`az{~\x7F0m";
+  const std::u16string others[] = {u"\u00E9", u"\u00DF", u"\U0001044F", u"\u0101"};
+  for (const std::u16string& other : others) {
+    for (std::size_t at = 0; at <= edges.size(); ++at) {
+      const std::u16string word = edges.substr(0, at) + other + edges.substr(at);
+      std::u16string cut;
+      std::int32_t position = 0;
+      splitter.Split(std::u16string_view(word), position,
+                     [&](const SplitWord& w) { cut = std::u16string(w.cut); });
+      EXPECT_EQ(cut, ToUpper(std::u16string_view(word))) << Utf16ToUtf8(word);
+    }
+  }
+}
+
 TEST(WordSplitter, DroppedWordsKeepTheirSentenceGap) {
   TestFilter filter;
   CWordSplitter splitter(CSeparatorSet(DefaultSeparators()), false, &filter);

@@ -130,8 +130,8 @@ QM_C_API int32_t qm_invoke(qm_object* object, int32_t dispid, qm_variant* args,
 /* Frees what the library allocated for a result and empties it. */
 QM_C_API void qm_variant_clear(qm_variant* variant);
 
-/* The error information the calling thread's last qm_invoke (or qm_create)
- * left, as UTF-8: set by every failure, and also by a method that refuses
+/* The error information the calling thread's last call of this interface
+ * (other than the error, version, count and reference calls) left, as UTF-8: set by every failure, and also by a method that refuses
  * while returning QM_S_OK. Empty texts when the call left none. Valid until
  * the thread's next call. */
 QM_C_API const char* qm_error_description(void);

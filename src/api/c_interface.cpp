@@ -200,6 +200,13 @@ const qm::DispatchMethod* MethodOf(const qm_object* object, int32_t dispid) {
   return object == nullptr ? nullptr : object->table->Find(dispid);
 }
 
+int32_t NoMethod(const qm_object* object, int32_t dispid) {
+  if (object == nullptr) return Fail(QM_E_POINTER, "The object is null");
+  return Fail(QM_DISP_E_MEMBERNOTFOUND, object->table->InterfaceName() +
+                                            " has no method with dispatch identifier " +
+                                            std::to_string(dispid));
+}
+
 }  // namespace
 
 extern "C" {
@@ -269,25 +276,27 @@ int32_t qm_get_dispid(const qm_object* object, const char* name, int32_t* dispid
 
 int32_t qm_method_name(const qm_object* object, int32_t dispid, const char** name,
                        int32_t* parameter_count) {
+  BeginCall();
   const qm::DispatchMethod* method = MethodOf(object, dispid);
-  if (method == nullptr) return QM_DISP_E_MEMBERNOTFOUND;
+  if (method == nullptr) return NoMethod(object, dispid);
   if (name != nullptr) *name = method->name.c_str();
   if (parameter_count != nullptr) *parameter_count = static_cast<int32_t>(method->parameters.size());
-  return QM_S_OK;
+  return EndCall(QM_S_OK);
 }
 
 int32_t qm_method_parameter(const qm_object* object, int32_t dispid, int32_t index,
                             const char** name, int32_t* type, int32_t* is_result) {
+  BeginCall();
   const qm::DispatchMethod* method = MethodOf(object, dispid);
-  if (method == nullptr) return QM_DISP_E_MEMBERNOTFOUND;
+  if (method == nullptr) return NoMethod(object, dispid);
   if (index < 0 || index >= static_cast<int32_t>(method->parameters.size())) {
-    return QM_E_INVALIDARG;
+    return Fail(QM_E_INVALIDARG, method->name + " has no parameter " + std::to_string(index));
   }
   const qm::DispatchParameter& parameter = method->parameters[static_cast<std::size_t>(index)];
   if (name != nullptr) *name = parameter.name.c_str();
   if (type != nullptr) *type = VariantTypeOf(parameter.type);
   if (is_result != nullptr) *is_result = parameter.is_result ? 1 : 0;
-  return QM_S_OK;
+  return EndCall(QM_S_OK);
 }
 
 int32_t qm_invoke(qm_object* object, int32_t dispid, qm_variant* args, int32_t arg_count,
@@ -296,11 +305,7 @@ int32_t qm_invoke(qm_object* object, int32_t dispid, qm_variant* args, int32_t a
   try {
     if (object == nullptr) return Fail(QM_E_POINTER, "qm_invoke: the object is null");
     const qm::DispatchMethod* method = object->table->Find(dispid);
-    if (method == nullptr) {
-      return Fail(QM_DISP_E_MEMBERNOTFOUND, object->table->InterfaceName() +
-                                                " has no method with dispatch identifier " +
-                                                std::to_string(dispid));
-    }
+    if (method == nullptr) return NoMethod(object, dispid);
     const int32_t in_count = method->InCount();
     // A by-ref argument may stand for the result, after the in arguments.
     qm_variant* out_argument = nullptr;

@@ -333,6 +333,10 @@ TEST_F(CInterfaceTest, ArgumentsAreCheckedBeforeAnyCallAndNothingCrashes) {
   }
   EXPECT_EQ(qm_get_dispid(search_, "NoSuchMethod", &dispid), QM_DISP_E_UNKNOWNNAME);
   EXPECT_STREQ(qm_error_description(), "IAPISearch has no method named NoSuchMethod");
+  EXPECT_EQ(qm_method_name(search_, 45, nullptr, nullptr), QM_DISP_E_MEMBERNOTFOUND);
+  EXPECT_STREQ(qm_error_description(), "IAPISearch has no method with dispatch identifier 45");
+  EXPECT_EQ(qm_method_parameter(search_, 3, 3, nullptr, nullptr, nullptr), QM_E_INVALIDARG);
+  EXPECT_STREQ(qm_error_description(), "GetSql has no parameter 3");
   EXPECT_EQ(qm_invoke(nullptr, 1, nullptr, 0, nullptr), QM_E_POINTER);
   EXPECT_EQ(qm_invoke(search_, 24, nullptr, 2, nullptr), QM_E_POINTER);
   qm_object* none = nullptr;

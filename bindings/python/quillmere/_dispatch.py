@@ -96,14 +96,24 @@ def _python_name(name, index, taken):
     return name
 
 
+# The Python type a parameter or result of each variant type shows as.
+_PYTHON_TYPES = {lib_types.VT_I4: int, lib_types.VT_R8: float, lib_types.VT_BOOL: bool,
+                 lib_types.VT_UTF16: str}
+
+
 def _make_function(method):
+    """The method as a function of the class, with the in parameters as its
+    signature (annotated with their Python types) and its dispatch identifier
+    as the attribute dispid."""
     params = [inspect.Parameter("self", inspect.Parameter.POSITIONAL_ONLY)]
     taken = {"self"}
-    for index, (name, _) in enumerate(method.parameters):
+    for index, (name, vt) in enumerate(method.parameters):
         name = _python_name(name, index, taken)
         taken.add(name)
-        params.append(inspect.Parameter(name, inspect.Parameter.POSITIONAL_OR_KEYWORD))
-    signature = inspect.Signature(params)
+        params.append(inspect.Parameter(name, inspect.Parameter.POSITIONAL_OR_KEYWORD,
+                                        annotation=_PYTHON_TYPES.get(vt, object)))
+    returns = _PYTHON_TYPES.get(method.result_type) if method.result_type is not None else None
+    signature = inspect.Signature(params, return_annotation=returns)
 
     def call(self, *args, **kwargs):
         bound = signature.bind(self, *args, **kwargs)
@@ -112,9 +122,8 @@ def _make_function(method):
     call.__name__ = method.name
     call.__qualname__ = method.name
     call.__signature__ = signature
-    returns = {None: "None", lib_types.VT_I4: "int", lib_types.VT_R8: "float",
-               lib_types.VT_BOOL: "bool", lib_types.VT_UTF16: "str"}[method.result_type]
-    call.__doc__ = f"Dispatch identifier {method.dispid}; returns {returns}."
+    call.__doc__ = f"{method.name}, dispatch identifier {method.dispid}."
+    call.dispid = method.dispid
     return call
 
 

@@ -3,13 +3,14 @@ converted by parameter type, objects released, the library found."""
 
 import gc
 import inspect
+import json
 import os
 import subprocess
 import sys
 import unittest
 
 import quillmere
-from support import DataDirectoryTest
+from support import SOURCE_DATA, DataDirectoryTest
 
 IGO_SEPARATORS = -3
 OGO_IGNORE_CHARS = -1
@@ -24,21 +25,30 @@ class MethodTableTest(unittest.TestCase):
                 self.assertEqual(len(names), count)
                 self.assertIn(last, names)
 
-    def test_signatures_hold_the_in_parameters_and_not_the_result(self):
-        search = quillmere.APISearch()
-        command = quillmere.APICommand()
-        cases = [
-            (search.GetRawKeyStringEx, ["Start", "Count", "CmdNumber"]),
-            (search.GetVersion, []),
-            (search.AdjustScoreEx,
-             ["StartValue", "StepValue", "AdjustmentType", "StopCount", "StopAtZero"]),
-            (command.FindexExist, ["FindexName", "Group"]),
-            (command.CreateFindexEx, ["IndexName", "SQLSelect", "IndexColumns", "KeyColumn",
-                                      "Blocking", "DateTimeUpdateKey"]),
-        ]
-        for method, parameters in cases:
-            with self.subTest(method.__name__):
-                self.assertEqual(list(inspect.signature(method).parameters), parameters)
+    def test_methods_match_the_installed_description(self):
+        # quillmere-api.json, which ships with the library, describes every
+        # method; the package reads its methods from the library instead, and
+        # both must agree.
+        with open(os.path.join(SOURCE_DATA, "quillmere-api.json"), encoding="utf-8") as file:
+            description = json.load(file)
+        types = {"long": int, "double": float, "VARIANT_BOOL": bool, "BSTR": str}
+        classes = {"APICommand": quillmere.APICommand, "APISearch": quillmere.APISearch}
+        self.assertEqual(sorted(c["name"] for c in description["classes"]), sorted(classes))
+        for described in description["classes"]:
+            cls = classes[described["name"]]
+            self.assertEqual(cls().prog_id, described["progId"])
+            for method in described["interface"]["methods"]:
+                with self.subTest(cls=cls.__name__, method=method["name"]):
+                    function = getattr(cls, method["name"])
+                    self.assertEqual(function.dispid, method["dispid"])
+                    signature = inspect.signature(function)
+                    ins = [p for p in method["parameters"] if p["direction"] == "in"]
+                    outs = [p for p in method["parameters"] if p["direction"] != "in"]
+                    self.assertEqual([(p.name, p.annotation)
+                                      for p in list(signature.parameters.values())[1:]],
+                                     [(p["name"], types[p["type"]]) for p in ins])
+                    self.assertEqual(signature.return_annotation,
+                                     types[outs[0]["type"]] if outs else None)
 
     def test_names_match_without_regard_to_case(self):
         with quillmere.APISearch() as search:

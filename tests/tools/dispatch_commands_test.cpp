@@ -327,6 +327,43 @@ TEST_F(DispatchCommandsTest, ReplJsonAnswersAreJsonObjectsOfResultOutAndError) {
   EXPECT_TRUE(Contains(parsed.back(), "nosuch")) << parsed.back();
 }
 
+TEST_F(DispatchCommandsTest, ReplSplitsWordsAsAShellDoes) {
+  ASSERT_EQ(Call({"APICommand", "ExecuteEx", kCreateBooks, "-1"}).status, 0);
+  // The separator of a word list comes back between the words as it was
+  // typed, after the line's quoting.
+  struct Case {
+    std::string separator;
+    std::string answer;
+  };
+  const std::vector<Case> cases = {
+      {"-", "MARKET-MOUNTAIN"},
+      {"-  \t ", "MARKET-MOUNTAIN"},
+      {"x\\ ", "MARKETx MOUNTAIN"},
+      {"a\\ b", "MARKETa bMOUNTAIN"},
+      {"'a  \"b\\'", "MARKETa  \"b\\\\MOUNTAIN"},
+      {"\"x\\\"y\\\\z\"", "MARKETx\"y\\\\zMOUNTAIN"},
+      {"\"p\\q\"", "MARKETp\\\\qMOUNTAIN"},
+      {"'it''s'\"!\"", "MARKETits!MOUNTAIN"},
+      {"''", "MARKETMOUNTAIN"},
+      {"\"open", "! a double quote is not closed"},
+      {"'open", "! a single quote is not closed"},
+      {"x\\", "! a backslash ends the line"},
+      {"- extra", "! GetFindexWordsEx takes 5 arguments, 6 given"},
+  };
+  std::string script;
+  for (const Case& c : cases) {
+    script += "\tAPISearch.GetFindexWordsEx  Books 1 10 'm*' " + c.separator + "\n";
+  }
+  const Result r = Host({"repl"}, script);
+  ASSERT_EQ(r.status, 0) << r.err;
+  const std::vector<std::string> lines = Lines(r.out);
+  ASSERT_EQ(lines.size(), cases.size()) << r.out;
+  for (std::size_t i = 0; i < cases.size(); ++i) {
+    EXPECT_EQ(lines[i].substr(0, cases[i].answer.size()), cases[i].answer)
+        << cases[i].separator;
+  }
+}
+
 TEST_F(DispatchCommandsTest, ReplTellsTheNullTextFromTheWordNull) {
   const std::string get = "APICommand.GetIndexGeneralOption " + std::to_string(igoSeparators) +
                           " true\n";

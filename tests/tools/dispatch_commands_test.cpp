@@ -11,6 +11,7 @@
 #include "config/global_defs.h"
 #include "quillmere/api_enums.h"
 #include "sources/share_database.h"
+#include "support/host_run.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -18,11 +19,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Result {
-  int status = -1;
-  std::string out;
-  std::string err;
-};
+using Result = test::HostResult;
 
 using Args = std::vector<std::string>;
 
@@ -46,33 +43,16 @@ class DispatchCommandsTest : public ::testing::Test {
       fs::create_directories(dir_.Path() + "data/Groups/PUBLIC/" + folder);
     }
     ASSERT_EQ(Host({"init"}).status, 0);
-    connect_ = "Driver=SQLite3;Database=" + dir_.Path() + "books.db;StepAPI=1;";
-    CGlobalDefs defs;
-    defs.SetConnectionString(connect_, "books.db");
-    CShareDatabase db(defs);
-    db.Connect();
-    int16_t columns = 0;
-    for (const char* statement :
-         {"create table books (id integer, title varchar(60))",
-          "insert into books values (1, 'River fish'), (2, 'The river bank'),"
-          " (3, 'Mountain'), (4, 'Quiet river'), (5, 'Fish market')"}) {
-      db.ExecuteSql(statement, columns);
-    }
-    db.Disconnect();
+    connect_ = test::SqliteDatabase(
+        dir_.Path() + "books.db",
+        {"create table books (id integer, title varchar(60))",
+         "insert into books values (1, 'River fish'), (2, 'The river bank'),"
+         " (3, 'Mountain'), (4, 'Quiet river'), (5, 'Fish market')"});
   }
 
   // The host with the scratch data folder; input feeds its standard input.
   Result Host(const Args& args, const std::string& input = std::string()) {
-    Result r;
-    const std::string err_file = dir_.Path() + "stderr.txt";
-    const std::string in_file = dir_.Path() + "stdin.txt";
-    test::WriteFile(in_file, input);
-    Args argv{"/bin/sh", "-c", "e=$1; i=$2; shift 2; exec \"$@\" 2> \"$e\" < \"$i\"", "sh",
-              err_file, in_file, QM_CLI_PATH, "--data", dir_.Path() + "data"};
-    argv.insert(argv.end(), args.begin(), args.end());
-    r.status = test::RunProgram(argv, &r.out);
-    r.err = test::ReadFile(err_file);
-    return r;
+    return test::RunHost(dir_.Path(), args, input);
   }
 
   Result Call(const Args& args) {

@@ -14,6 +14,7 @@
 
 #include "config/global_defs.h"
 #include "sources/share_database.h"
+#include "support/host_run.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -21,11 +22,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Result {
-  int status = -1;
-  std::string out;
-  std::string err;
-};
+using Result = test::HostResult;
 
 class EngineCommandsTest : public ::testing::Test {
  protected:
@@ -36,27 +33,12 @@ class EngineCommandsTest : public ::testing::Test {
   }
 
   Result Host(const std::vector<std::string>& args) {
-    Result r;
-    const std::string err_file = dir_.Path() + "stderr.txt";
-    std::vector<std::string> argv{"/bin/sh", "-c", "e=$1; shift; exec \"$@\" 2> \"$e\"", "sh",
-                                  err_file, QM_CLI_PATH, "--data", dir_.Path() + "data"};
-    argv.insert(argv.end(), args.begin(), args.end());
-    r.status = test::RunProgram(argv, &r.out);
-    r.err = test::ReadFile(err_file);
-    return r;
+    return test::RunHost(dir_.Path(), args);
   }
 
   // Runs SQL on books.db of the scratch folder; returns its connection string.
   std::string Books(const std::vector<std::string>& statements) {
-    const std::string connect = "Driver=SQLite3;Database=" + dir_.Path() + "books.db;StepAPI=1;";
-    CGlobalDefs defs;
-    defs.SetConnectionString(connect, "books");
-    CShareDatabase db(defs);
-    db.Connect();
-    int16_t columns = 0;
-    for (const auto& statement : statements) db.ExecuteSql(statement, columns);
-    db.Disconnect();
-    return connect;
+    return test::SqliteDatabase(dir_.Path() + "books.db", statements);
   }
 
   test::ScratchDir dir_{"host"};

@@ -11,6 +11,7 @@
 
 #include "config/global_defs.h"
 #include "sources/share_database.h"
+#include "support/host_run.h"
 #include "support/test_support.h"
 
 namespace qm {
@@ -18,11 +19,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Result {
-  int status = -1;
-  std::string out;
-  std::string err;
-};
+using Result = test::HostResult;
 
 using Args = std::vector<std::string>;
 
@@ -71,27 +68,12 @@ class SearchCommandsTest : public ::testing::Test {
   }
 
   Result Host(const Args& args) {
-    Result r;
-    const std::string err_file = dir_.Path() + "stderr.txt";
-    Args argv{"/bin/sh", "-c", "e=$1; shift; exec \"$@\" 2> \"$e\"", "sh",
-              err_file, QM_CLI_PATH, "--data", dir_.Path() + "data"};
-    argv.insert(argv.end(), args.begin(), args.end());
-    r.status = test::RunProgram(argv, &r.out);
-    r.err = test::ReadFile(err_file);
-    return r;
+    return test::RunHost(dir_.Path(), args);
   }
 
   // Runs SQL on a database file of the scratch folder; returns its connection string.
   std::string Database(const std::string& file, const std::vector<std::string>& statements) {
-    const std::string connect = "Driver=SQLite3;Database=" + dir_.Path() + file + ";StepAPI=1;";
-    CGlobalDefs defs;
-    defs.SetConnectionString(connect, file);
-    CShareDatabase db(defs);
-    db.Connect();
-    int16_t columns = 0;
-    for (const auto& statement : statements) db.ExecuteSql(statement, columns);
-    db.Disconnect();
-    return connect;
+    return test::SqliteDatabase(dir_.Path() + file, statements);
   }
 
   test::ScratchDir dir_{"search-host"};

@@ -70,7 +70,14 @@ const std::vector<Enumeration>& Enumerations() {
 #undef QM_ENUM_VALUE
 
 // Every text here is plain ASCII without quotes or backslashes.
-std::string Quoted(std::string_view text) { return "\"" + std::string(text) + "\""; }
+std::string Quoted(std::string_view text) {
+  std::string out;
+  out.reserve(text.size() + 2);
+  out.push_back('"');
+  out.append(text);
+  out.push_back('"');
+  return out;
+}
 
 const char* TypeName(DispatchType type) {
   switch (type) {

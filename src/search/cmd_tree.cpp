@@ -64,25 +64,36 @@ bool IsIdentifierChar(char16_t c) {
          c == u'_';
 }
 
+constexpr std::u16string_view kScoreWord = u"SCORE";
+
+// The position of the next whole-word "SCORE" of head at or after from (a
+// column such as MYSCORE does not count), or npos.
+std::size_t NextScoreWord(std::u16string_view head, std::size_t from) {
+  for (auto at = head.find(kScoreWord, from); at != std::u16string_view::npos;
+       at = head.find(kScoreWord, at + 1)) {
+    const std::size_t end = at + kScoreWord.size();
+    if ((at == 0 || !IsIdentifierChar(head[at - 1])) &&
+        (end == head.size() || !IsIdentifierChar(head[end]))) {
+      return at;
+    }
+  }
+  return std::u16string_view::npos;
+}
+
 // Replaces each whole-word "SCORE" of the head together with a comma that
 // follows it ("SCORE,") or, failing that, one that precedes it (",SCORE").
-// A column such as MYSCORE is left alone.
 std::u16string ReplaceScoreColumn(std::u16string_view head, std::u16string_view with_comma_after,
                                   std::u16string_view with_comma_before) {
-  static constexpr std::u16string_view kScore = u"SCORE";
   std::u16string out;
   std::size_t i = 0;
-  while (i < head.size()) {
-    const auto at = head.find(kScore, i);
-    if (at == std::u16string_view::npos) break;
-    const std::size_t end = at + kScore.size();
-    const bool whole = (at == 0 || !IsIdentifierChar(head[at - 1])) &&
-                       (end == head.size() || !IsIdentifierChar(head[end]));
-    if (whole && end < head.size() && head[end] == u',') {
+  for (auto at = NextScoreWord(head, i); at != std::u16string_view::npos;
+       at = NextScoreWord(head, i)) {
+    const std::size_t end = at + kScoreWord.size();
+    if (end < head.size() && head[end] == u',') {
       out.append(head.substr(i, at - i));
       out.append(with_comma_after);
       i = end + 1;
-    } else if (whole && at > 0 && head[at - 1] == u',') {
+    } else if (at > 0 && head[at - 1] == u',') {
       out.append(head.substr(i, at - 1 - i));
       out.append(with_comma_before);
       i = end;
@@ -97,18 +108,13 @@ std::u16string ReplaceScoreColumn(std::u16string_view head, std::u16string_view 
 
 // Every whole-word "SCORE" of the head replaced by text.
 std::u16string ReplaceScoreWord(std::u16string_view head, std::u16string_view text) {
-  static constexpr std::u16string_view kScore = u"SCORE";
   std::u16string out;
   std::size_t i = 0;
-  while (i < head.size()) {
-    const auto at = head.find(kScore, i);
-    if (at == std::u16string_view::npos) break;
-    const std::size_t end = at + kScore.size();
+  for (auto at = NextScoreWord(head, i); at != std::u16string_view::npos;
+       at = NextScoreWord(head, i)) {
     out.append(head.substr(i, at - i));
-    const bool whole = (at == 0 || !IsIdentifierChar(head[at - 1])) &&
-                       (end == head.size() || !IsIdentifierChar(head[end]));
-    out.append(whole ? text : kScore);
-    i = end;
+    out.append(text);
+    i = at + kScoreWord.size();
   }
   out.append(head.substr(i));
   return out;

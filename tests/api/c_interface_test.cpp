@@ -67,9 +67,8 @@ class CInterfaceTest : public test::CommandFixture {
  protected:
   void SetUp() override {
     CommandFixture::SetUp();
-    ASSERT_TRUE(LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini"));
-    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
-                          std::filesystem::copy_options::recursive);
+    UseShippedMessages();
+    UseShippedLanguages();
     Sql({"create table docs (id integer, body varchar(100), n integer)",
          "insert into docs values (1, 'red wine', 3)", "insert into docs values (2, 'red beer', 1)",
          "insert into docs values (3, 'white wine', 2)"});

@@ -11,6 +11,7 @@
 #include <string_view>
 #include <vector>
 
+#include "base/error_messages.h"
 #include "platform/text_encoding.h"
 #include "quillmere/api_command.h"
 #include "config/global_defs.h"
@@ -33,6 +34,17 @@ class CommandFixture : public ::testing::Test {
   }
 
   void TearDown() override { command_.reset(); }
+
+  // The shipped language data in the data directory (what searches and
+  // builds with language steps read).
+  void UseShippedLanguages() {
+    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
+                          std::filesystem::copy_options::recursive);
+  }
+  // The shipped table of numbered error messages.
+  static void UseShippedMessages() {
+    ASSERT_TRUE(LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini"));
+  }
 
   void LayOutGroup(const std::string& group) {
     for (const char* folder : kGroupFolders) {

@@ -19,9 +19,8 @@ class SearchObjectTest : public test::CommandFixture {
  protected:
   void SetUp() override {
     CommandFixture::SetUp();
-    ASSERT_TRUE(LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini"));
-    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
-                          std::filesystem::copy_options::recursive);
+    UseShippedMessages();
+    UseShippedLanguages();
     UseSqlite();
     // Word counts make the scores: 1 > 2 > 3 = 4 = 6 for APPLE.
     Sql({"create table docs (id integer, body varchar(200), n integer, born timestamp,"

@@ -32,7 +32,7 @@ class AttachedOrderTest : public test::CommandFixture {
  protected:
   void SetUp() override {
     CommandFixture::SetUp();
-    ASSERT_TRUE(LoadErrorMessagesFromFile(std::string(QM_SOURCE_DATA_DIR) + "System/mrvconf.ini"));
+    UseShippedMessages();
     UseSqlite();
     Sql({"create table items (id integer, n integer, r double precision, d timestamp)",
          "insert into items values (1, 7, 2.5, '2024-02-29 13:45:59')",

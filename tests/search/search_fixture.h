@@ -32,8 +32,7 @@ class SearchFixture : public CommandFixture {
  protected:
   void SetUp() override {
     CommandFixture::SetUp();
-    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
-                          std::filesystem::copy_options::recursive);
+    UseShippedLanguages();
     UseSqlite();
   }
 

@@ -19,8 +19,7 @@ class StatementCatalogueTest : public test::CommandFixture {
  protected:
   void SetUp() override {
     CommandFixture::SetUp();
-    std::filesystem::copy(std::string(QM_SOURCE_DATA_DIR) + "Language", home_.Data() + "Language",
-                          std::filesystem::copy_options::recursive);
+    UseShippedLanguages();
     UseSqlite();
     defs_ = Defs();
   }

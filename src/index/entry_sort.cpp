@@ -17,6 +17,7 @@
 #include "config/temp_names.h"
 #include "format/sort_stream.h"
 #include "platform/file_io.h"
+#include "platform/huge_pages.h"
 
 namespace qm {
 
@@ -79,6 +80,8 @@ void CEntrySort::Allocate() {
     CheckAllocationSize(buffer_bytes_);
     // Not zeroed: pages are only touched as entries arrive.
     buffer_ = std::make_unique_for_overwrite<std::byte[]>(buffer_bytes_);
+    // The merge reads the buffer's entries in sorted order, all over it.
+    platform::AdviseHugePages(buffer_.get(), buffer_bytes_);
   } catch (const std::bad_alloc&) {
     RaiseAllocationFailure();
   }
@@ -314,6 +317,9 @@ class CEntrySort::Merger {
   }
 
  private:
+  // How far ahead of a piece's next slot its entry is fetched into the cache.
+  static constexpr std::ptrdiff_t kPrefetchSlots = 16;
+
   struct Input {
     explicit Input(const SortEntryLayout& layout) : reader(layout) {}
     SortFileReader reader;
@@ -329,7 +335,11 @@ class CEntrySort::Merger {
     Input& in = inputs_[static_cast<std::size_t>(i)];
     if (in.slot_end != nullptr) {
       if (in.slot == in.slot_end) return false;
-      in.entry = reinterpret_cast<const uint8_t*>(sort_.buffer_.get()) + in.slot->offset;
+      const auto* base = reinterpret_cast<const uint8_t*>(sort_.buffer_.get());
+      // A piece's slots are in order of value, its entries in the order they
+      // came: each entry is a cache miss unless asked for well ahead.
+      if (in.slot_end - in.slot > kPrefetchSlots) __builtin_prefetch(base + in.slot[kPrefetchSlots].offset);
+      in.entry = base + in.slot->offset;
       in.size = sort_.layout_.SizeOf(in.entry);
       ++in.slot;
       return true;

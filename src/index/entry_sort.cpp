@@ -16,6 +16,7 @@
 #include "config/megabyte_setting.h"
 #include "config/temp_names.h"
 #include "format/sort_stream.h"
+#include "index/entry_block_queue.h"
 #include "platform/file_io.h"
 #include "platform/huge_pages.h"
 
@@ -234,10 +235,11 @@ class CEntrySort::Merger {
  public:
   Merger(CEntrySort& sort, int64_t work) : sort_(sort), work_(work) {}
 
-  // Merges runs of file and pieces into out (from its current end); returns
-  // the bytes written.
+  // Merges runs of file and pieces into out, anything with Put(entry, size);
+  // returns the bytes put.
+  template <class Sink>
   int64_t Run(MFile& file, const std::vector<CEntrySort::Run>& runs,
-              const std::vector<SlotRange>& pieces, MFile& out) {
+              const std::vector<SlotRange>& pieces, Sink& out) {
     inputs_.clear();
     inputs_.reserve(runs.size() + 1);
     for (const CEntrySort::Run& run : runs) {
@@ -249,8 +251,6 @@ class CEntrySort::Merger {
       inputs_.back().slot = piece.begin;
       inputs_.back().slot_end = piece.end;
     }
-    SortFileWriter writer;
-    writer.Start(out);
     int64_t bytes = 0;
     sort_.layout_.WithComparison([&](auto compare) {
       // Whether input a's entry comes after input b's. The prefixes settle
@@ -301,8 +301,7 @@ class CEntrySort::Merger {
       for (std::size_t at = heap.size() / 2; at-- > 0;) sift_down(at);
       while (!heap.empty()) {
         const int i = heap.front();
-        writer.Put(inputs_[static_cast<std::size_t>(i)].entry,
-                   inputs_[static_cast<std::size_t>(i)].size);
+        out.Put(inputs_[static_cast<std::size_t>(i)].entry, inputs_[static_cast<std::size_t>(i)].size);
         bytes += static_cast<int64_t>(inputs_[static_cast<std::size_t>(i)].size);
         if (!next(i)) {
           heap.front() = heap.back();
@@ -312,7 +311,6 @@ class CEntrySort::Merger {
         if (++merged_ % kProgressStep == 0 && work_ > 0) ShowProgress();
       }
     });
-    writer.Finish();
     return bytes;
   }
 
@@ -366,7 +364,10 @@ void CEntrySort::SpillRun() {
   const int64_t begin =
       runs_in_file_.empty() ? 0 : runs_in_file_.back().begin + runs_in_file_.back().bytes;
   Merger merge(*this, 0);
-  runs_in_file_.push_back(Run{begin, merge.Run(run_file_, {}, pieces, run_file_)});
+  SortFileWriter writer;
+  writer.Start(run_file_);
+  runs_in_file_.push_back(Run{begin, merge.Run(run_file_, {}, pieces, writer)});
+  writer.Finish();
   ++runs_;
   ClearBuffer();
   run_seconds_ += SecondsSince(start);
@@ -374,13 +375,32 @@ void CEntrySort::SpillRun() {
 
 void CEntrySort::Finish(MFile& sorted) {
   try {
-    Merge(sorted);
+    Merge([&](auto& merge, std::vector<Run>& runs, const std::vector<SlotRange>& pieces) {
+      OpenSortFile(defs_, sorted);
+      SortFileWriter writer;
+      writer.Start(sorted);
+      merge.Run(run_file_, runs, pieces, writer);
+      writer.Finish();
+    });
+    sorted.Seek(0);
   } catch (const std::bad_alloc&) {
     RaiseAllocationFailure();
   }
 }
 
-void CEntrySort::Merge(MFile& sorted) {
+void CEntrySort::Finish(EntryBlockQueue& merged) {
+  try {
+    Merge([&](auto& merge, std::vector<Run>& runs, const std::vector<SlotRange>& pieces) {
+      merge.Run(run_file_, runs, pieces, merged);
+    });
+    merged.Close();
+  } catch (const std::bad_alloc&) {
+    RaiseAllocationFailure();
+  }
+}
+
+template <class FinalPass>
+void CEntrySort::Merge(FinalPass&& final_pass) {
   const Clock::time_point start = Clock::now();
   // The last run stays in memory and joins the final merge as its last input,
   // unless passes before it must merge groups of runs first.
@@ -397,22 +417,24 @@ void CEntrySort::Merge(MFile& sorted) {
   while (runs_in_file_.size() > merge_ways_) {
     MFile next;
     OpenSortFile(defs_, next);
+    SortFileWriter writer;
+    writer.Start(next);
     std::vector<Run> merged;
     for (std::size_t first = 0; first < runs_in_file_.size(); first += merge_ways_) {
       const std::size_t last = std::min(first + merge_ways_, runs_in_file_.size());
       const std::vector<Run> group(runs_in_file_.begin() + static_cast<std::ptrdiff_t>(first),
                                    runs_in_file_.begin() + static_cast<std::ptrdiff_t>(last));
       const int64_t begin = merged.empty() ? 0 : merged.back().begin + merged.back().bytes;
-      merged.push_back(Run{begin, merge.Run(run_file_, group, {}, next)});
+      merged.push_back(Run{begin, merge.Run(run_file_, group, {}, writer)});
     }
+    writer.Finish();
     ++passes_;
     Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i",
           static_cast<int64_t>(merged.size()));
     run_file_.TakeOver(next);
     runs_in_file_ = std::move(merged);
   }
-  OpenSortFile(defs_, sorted);
-  merge.Run(run_file_, runs_in_file_, pieces, sorted);
+  final_pass(merge, runs_in_file_, pieces);
   ++passes_;
   Trace(defs_.TraceLevel1(), TraceTag(), "Sorting. Turns Left: %i", int64_t{1});
   buffer_.reset();
@@ -420,7 +442,6 @@ void CEntrySort::Merge(MFile& sorted) {
   ClearBuffer();
   run_file_.Close();
   runs_in_file_.clear();
-  sorted.Seek(0);
   defs_.SetProgress(kProgressSorted);
   merge_seconds_ += SecondsSince(start);
 }

@@ -27,7 +27,7 @@
 namespace qm {
 
 class CGlobalDefs;
-class SortFileWriter;
+class EntryBlockQueue;
 
 class CEntrySort {
  public:
@@ -70,6 +70,9 @@ class CEntrySort {
   // Sorts what was added into sorted, a new temporary file left open for
   // reading at its start, and frees the memory. Progress: 15 to 90.
   void Finish(MFile& sorted);
+  // The same, but the final merge puts its entries into merged, which it
+  // closes at the end, for a reader on another thread.
+  void Finish(EntryBlockQueue& merged);
   // Adds every entry of raw (written from its start, any position), closes
   // raw, and finishes into sorted.
   void Sort(MFile& raw, MFile& sorted);
@@ -99,7 +102,10 @@ class CEntrySort {
   };
   class Merger;
 
-  void Merge(MFile& sorted);
+  // Merges groups of runs until few enough are left, then calls
+  // final_pass(merger, runs, pieces) for the last merge.
+  template <class FinalPass>
+  void Merge(FinalPass&& final_pass);
 
   // A sorted piece of the buffer's slots.
   struct SlotRange {

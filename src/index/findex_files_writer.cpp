@@ -11,7 +11,7 @@
 
 #include "base/error_numbers.h"
 #include "format/sort_entry.h"
-#include "format/sort_stream.h"
+#include "index/sorted_entries.h"
 #include "platform/file_io.h"
 #include "format/bfile.h"
 #include "format/column_set.h"
@@ -67,7 +67,7 @@ void SetFindexLimitsForTesting(const FindexLimits& limits) {
 
 namespace {
 
-FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
+FindexWriteCounts WriteFiles(CIndexHeader& header, SortedEntries& sorted, const std::string& sdx_path,
                              const std::string& fst_path, const FindexLimits& limits,
                              std::function<void(int32_t rows)> batch_observer) {
   const CColumnSet columns = CColumnSet::FromGeneralFlags(header.GeneralFlags);
@@ -86,7 +86,7 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
   postings.SetBatchObserver(std::move(batch_observer));
 
   int64_t entries = 0;
-  const bool has_entries = !sorted.IsEOF();
+  const bool has_entries = !sorted.Empty();
   if (has_entries) {
     if (!IsFindexType(header.FindexType)) {
       throw CPiFIndexException::Text("Unknown findex type %i", kMethod, nullptr, header.FindexType);
@@ -94,11 +94,9 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
     const auto type = static_cast<VALUE_TYPE>(header.FindexType);
     const int32_t width = columns.Width();
     const auto row_bytes = static_cast<std::size_t>(width) * 4;
-    // Entries are taken in place from large pieces of the file; a value is
-    // decoded only where its bytes differ from the current word's.
+    // Entries are taken in place; a value is decoded only where its bytes
+    // differ from the current word's.
     const SortEntryLayout layout(width, type);
-    SortFileReader reader(layout);
-    reader.Start(sorted);
     std::vector<int32_t> row(static_cast<std::size_t>(width));
     auto take_row = [&](const uint8_t* entry) {
       for (int32_t i = 0; i < width; ++i) {
@@ -112,7 +110,7 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
     CValue current(type);
     CValue next(type);
     std::size_t size = 0;
-    const uint8_t* entry = reader.Next(size);
+    const uint8_t* entry = sorted.Next(size);
     take_row(entry);
     layout.DecodeValue(entry, current);
     current_bytes.assign(entry + row_bytes, entry + size);
@@ -123,7 +121,7 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
       for (;;) {
         postings.AddEntry(row.data());
         ++entries;
-        entry = reader.Next(size);
+        entry = sorted.Next(size);
         if (entry == nullptr) {
           more = false;
           break;
@@ -171,6 +169,17 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, MFile& sorted, const std::str
 
 FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
                                    const std::string& fst_path, const FindexLimits& limits,
+                                   std::function<void(int32_t rows)> batch_observer) {
+  SortedFileEntries entries(
+      SortEntryLayout(CColumnSet::FromGeneralFlags(header.GeneralFlags).Width(),
+                      static_cast<VALUE_TYPE>(header.FindexType)),
+      sorted);
+  return WriteFindexFiles(header, entries, sdx_path, fst_path, limits, std::move(batch_observer));
+}
+
+FindexWriteCounts WriteFindexFiles(CIndexHeader& header, SortedEntries& sorted,
+                                   const std::string& sdx_path, const std::string& fst_path,
+                                   const FindexLimits& limits,
                                    std::function<void(int32_t rows)> batch_observer) {
   try {
     return WriteFiles(header, sorted, sdx_path, fst_path, limits, std::move(batch_observer));

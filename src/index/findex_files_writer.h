@@ -1,6 +1,7 @@
-// WriteFindexFiles: the second half of a findex build. Turns the sorted entry
-// file of the word sort (CPiSort, build/word_sort.h) into the two files of a
-// findex: the word tree with its header in block 0, and the posting file.
+// WriteFindexFiles: the second half of a findex build. Turns the sorted
+// entries of the word sort (CPiSort, index/word_sort.h), from a file or from
+// its merge as it runs, into the two files of a findex: the word tree with
+// its header in block 0, and the posting file.
 #pragma once
 
 #include <cstdint>
@@ -14,6 +15,7 @@
 namespace qm {
 
 class MFile;
+class SortedEntries;
 
 // What the files of a findex can address: block numbers of 16 bits in the
 // leaf chain, positions of 31 bits in the posting file.
@@ -44,6 +46,11 @@ struct FindexWriteCounts {
 // would misread.
 FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
                                    const std::string& fst_path, const FindexLimits& limits,
+                                   std::function<void(int32_t rows)> batch_observer = {});
+// The same from entries handed over in order (a merge still running).
+FindexWriteCounts WriteFindexFiles(CIndexHeader& header, SortedEntries& sorted,
+                                   const std::string& sdx_path, const std::string& fst_path,
+                                   const FindexLimits& limits,
                                    std::function<void(int32_t rows)> batch_observer = {});
 
 }  // namespace qm

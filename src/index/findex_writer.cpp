@@ -6,6 +6,8 @@
 #include "base/error_numbers.h"
 #include "index/findex_file_set.h"
 #include "index/findex_files_writer.h"
+#include "index/sorted_entries.h"
+#include "format/column_set.h"
 #include "index/word_sort.h"
 #include "platform/file_io.h"
 #include "format/bfile.h"
@@ -140,14 +142,19 @@ void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
   Guarded("BuildRowFindex", [&] {
     findex::CheckFindexName(definition.IndexName, "BuildRowFindex");
     findex::RemoveOrphanedTempFiles(defs_);
-    MFile sorted;  // delete-on-close: gone once closed
+    // The sort's final merge runs beside the writer; failing, either one
+    // stops the other.
+    CPiSort sort(defs_);
     int64_t rows = 0;
+    const auto sort_failed = [] {
+      Trace(true, "PILIB_ERROR.PiFindex.BuildRowFindex", "SortFindexTable failed");
+    };
     try {
       // An update that finds no new row is done; a rebuild must index rows.
-      rows = CPiSort(defs_).SortFindexTable(
-          definition, sorted, rebuild ? CPiSort::NoRows::Raise : CPiSort::NoRows::Allow);
+      rows = sort.SortFindexRows(definition,
+                                 rebuild ? CPiSort::NoRows::Raise : CPiSort::NoRows::Allow);
     } catch (...) {
-      Trace(true, "PILIB_ERROR.PiFindex.BuildRowFindex", "SortFindexTable failed");
+      sort_failed();
       throw;
     }
     if (rows == 0) {
@@ -156,13 +163,26 @@ void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
       defs_.SetProgress(100);
       return;
     }
-    BuildFromSorted(definition, sorted, rebuild);
+    try {
+      BuildFromSorted(definition, sort.Merged(), rebuild);
+    } catch (...) {
+      if (sort.MergeFailed()) sort_failed();
+      throw;
+    }
   });
 }
 
 void CPiFIndex::BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool rebuild) {
+  SortedFileEntries entries(
+      SortEntryLayout(CColumnSet::FromGeneralFlags(definition.GeneralFlags).Width(),
+                      static_cast<VALUE_TYPE>(definition.FindexType)),
+      sorted);
+  BuildFromSorted(definition, entries, rebuild);
+}
+
+void CPiFIndex::BuildFromSorted(CIndexHeader& definition, SortedEntries& sorted, bool rebuild) {
   Guarded("BuildRowFindex", [&] {
-    if (!rebuild && sorted.IsEOF()) {
+    if (!rebuild && sorted.Empty()) {
       // An update that found nothing new keeps the findex as it is.
       Trace(defs_.TraceLevel1(), kTraceTag, "Could not read first row, aborting");
       defs_.SetProgress(100);

@@ -18,6 +18,8 @@
 
 namespace qm {
 
+class SortedEntries;
+
 class CPiFIndex {
  public:
   // Open modes of the file layer, plus 4: create the temporary build files.
@@ -52,6 +54,8 @@ class CPiFIndex {
   // without entries leaves the findex as it was. On failure only the
   // temporary files were touched, and they are gone.
   void BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool rebuild);
+  // The same from entries handed over in order (the sort's merge as it runs).
+  void BuildFromSorted(CIndexHeader& definition, SortedEntries& sorted, bool rebuild);
 
   // Removes the open findex with its add-ons and deleted-key file; an add-on
   // name ("_ADD_") raises error 44. REQUIRES: the caller holds the exclusive

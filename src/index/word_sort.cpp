@@ -140,7 +140,7 @@ std::size_t CPiSort::ConfiguredColumnTextBytes() {
 }
 
 int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definition,
-                                 MFile& sorted, std::optional<EntrySortingThread>& sorting) {
+                                 MFile* sorted) {
   database.AllocateCache();
   const RowPlan plan(database, definition);
   definition.FindexType = plan.findex_type;
@@ -149,7 +149,10 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
   const auto type = static_cast<VALUE_TYPE>(plan.findex_type);
   const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
   const SortEntryLayout layout(set.Width(), type);
-  sorting.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted, method_);
+  std::optional<EntrySortingThread>& sorting = sorting_;
+  sorting.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted,
+                  sorted != nullptr ? method_ : EntrySortingThread::Method::Runs);
+  merged_.emplace(layout, [this](std::vector<uint8_t>& block) { return PopMerged(block); });
   // Text is split on a thread of its own; other values are written here.
   std::optional<WordSplittingThread> splitting;
   std::optional<EntryWriter> writer;
@@ -268,8 +271,42 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
 }
 
 int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows no_rows) {
+  const int64_t rows = Sort(definition, &sorted, no_rows);
+  merged_.reset();
+  sorting_.reset();
+  return rows;
+}
+
+int64_t CPiSort::SortFindexRows(CIndexHeader& definition, NoRows no_rows) {
+  return Sort(definition, nullptr, no_rows);
+}
+
+SortedEntries& CPiSort::Merged() {
+  if (!merged_) throw CPiSortException::General("Merged");
+  return *merged_;
+}
+
+bool CPiSort::PopMerged(std::vector<uint8_t>& block) {
+  try {
+    return Guard<CPiSortException, CPiSortUnknownException>("SortFindexTable", [&] {
+      if (sorting_->PopMerged(block)) return true;
+      phases_.merge = SecondsSince(merge_start_);
+      phases_.runs = sorting_->RunSeconds();
+      phases_.run_count = sorting_->Runs();
+      return false;
+    });
+  } catch (...) {
+    merge_failed_ = true;
+    throw;
+  }
+}
+
+int64_t CPiSort::Sort(CIndexHeader& definition, MFile* sorted, NoRows no_rows) {
   cut_values_ = 0;
   phases_ = Phases{};
+  merge_failed_ = false;
+  merged_.reset();
+  sorting_.reset();
   return Guard<CPiSortException, CPiSortUnknownException>("SortFindexTable", [&] {
     // The connection stored with the findex serves when the caller set none;
     // the caller's settings stay as they are.
@@ -277,33 +314,41 @@ int64_t CPiSort::SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows
     if (!source.IsConnectionSet() && !definition.ConnectionString.empty()) {
       source.SetConnection(definition.ConnectionString, definition.DisplayName);
     }
-    std::optional<EntrySortingThread> sorting;
     int64_t rows = 0;
     const Clock::time_point start = Clock::now();
     try {
       CShareDatabase database(source);
       database.Connect();
       ExecuteSelect(database, definition);
-      rows = WriteFindexRows(database, definition, sorted, sorting);
+      rows = WriteFindexRows(database, definition, sorted);
     } catch (const EntryBlockQueue::Stopped&) {
       // The sorting thread failed first: its error ends the build.
-      sorting->Finish();
+      sorting_->Finish();
       throw CPiSortUnknownException::Unknown("SortFindexTable");
+    } catch (...) {
+      // Any other failure of the row loop stops the sorting thread and goes
+      // on as it is.
+      merged_.reset();
+      sorting_.reset();
+      throw;
     }
-    // Any other failure of the row loop stops the sorting thread (its
-    // destructor) and goes on as it is.
     phases_.row_loop = SecondsSince(start);
     if (rows == 0) {
-      sorting->Abort();
+      merged_.reset();
+      sorting_.reset();
       if (no_rows == NoRows::Allow) return rows;
       throw CPiSortException::Numbered(kErrFindexNoRows, "SortFindexTable", nullptr);
     }
     defs_.SetProgress(15);
-    const Clock::time_point merge_start = Clock::now();
-    sorting->Finish();
-    phases_.merge = SecondsSince(merge_start);
-    phases_.runs = sorting->RunSeconds();
-    phases_.run_count = sorting->Runs();
+    merge_start_ = Clock::now();
+    if (sorted == nullptr) {
+      sorting_->CloseInput();
+      return rows;
+    }
+    sorting_->Finish();
+    phases_.merge = SecondsSince(merge_start_);
+    phases_.runs = sorting_->RunSeconds();
+    phases_.run_count = sorting_->Runs();
     return rows;
   });
 }

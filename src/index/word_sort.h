@@ -9,14 +9,17 @@
 // bytes; double 8; date/time 16). Entries come by value, then key, stably.
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <vector>
 
 #include "config/global_defs.h"
 #include "format/index_header.h"
 #include "format/mfile.h"
 #include "index/entry_sorting_thread.h"
+#include "index/sorted_entries.h"
 
 namespace qm {
 
@@ -32,7 +35,8 @@ class CPiSort {
 
   // What the last SortFindexTable measured, in seconds: the row loop (with
   // runs sorted beside it), the sorting thread's time on runs, and the wait
-  // for the merge after the row loop.
+  // for the merge after the row loop (with SortFindexRows: from the end of
+  // the row loop to the last merged entry taken).
   struct Phases {
     double row_loop = 0;
     double runs = 0;
@@ -52,6 +56,17 @@ class CPiSort {
   // "max_column_text_mb" (MORVIL_MAX_COLUMN_TEXT_MB, default 64); a longer
   // value is cut, traced and counted in CutValues.
   int64_t SortFindexTable(CIndexHeader& definition, MFile& sorted, NoRows no_rows = NoRows::Raise);
+  // The same, but no sorted file is written: the final merge goes on on the
+  // sorting thread while the caller takes its entries from Merged(), so the
+  // findex writer works beside it. Progress reaches 90 when the last entry
+  // is merged.
+  int64_t SortFindexRows(CIndexHeader& definition, NoRows no_rows = NoRows::Raise);
+  // After SortFindexRows found rows: its entries in order, valid while this
+  // object lives. Raises the sorting thread's error (as SortFindexTable
+  // would) when the merge fails.
+  SortedEntries& Merged();
+  // Whether the error Merged() last raised was the sort's.
+  bool MergeFailed() const { return merge_failed_; }
 
   // Text values the last SortFindexTable cut at the column text limit.
   int64_t CutValues() const { return cut_values_; }
@@ -73,13 +88,20 @@ class CPiSort {
   // Decides the findex type from the executed selection's columns, starts
   // the sorting thread on sorted, then runs the row loop: every row into
   // entries for it. Returns the rows read; sorting holds the thread.
-  int64_t WriteFindexRows(CShareDatabase& database, CIndexHeader& definition, MFile& sorted,
-                          std::optional<EntrySortingThread>& sorting);
+  int64_t WriteFindexRows(CShareDatabase& database, CIndexHeader& definition, MFile* sorted);
+  // SortFindexTable into sorted, or SortFindexRows without it.
+  int64_t Sort(CIndexHeader& definition, MFile* sorted, NoRows no_rows);
+  // The next block of merged entries, for Merged().
+  bool PopMerged(std::vector<uint8_t>& block);
 
   CGlobalDefs& defs_;
   EntrySortingThread::Method method_ = EntrySortingThread::Method::Runs;
   int64_t cut_values_ = 0;
   Phases phases_;
+  std::optional<EntrySortingThread> sorting_;
+  std::optional<SortedBlockEntries> merged_;
+  std::chrono::steady_clock::time_point merge_start_;
+  bool merge_failed_ = false;
 };
 
 }  // namespace qm

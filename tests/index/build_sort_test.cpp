@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "base/exception.h"
+#include "index/findex_files_writer.h"
 #include "index/findex_writer.h"
 #include "index/word_sort.h"
 #include "support/findex_decoder.h"
@@ -201,8 +202,9 @@ TEST_P(BuildSortTestSqlite, AFailureInEitherThreadEndsTheBuildWithItsErrorAndKee
   const std::string t = Table("id INTEGER, body TEXT");
   Run("INSERT INTO " + t +
       " WITH RECURSIVE s(x) AS (SELECT 1 UNION ALL SELECT x + 1 FROM s WHERE x < 40000) "
-      "SELECT x, 'word' || (x % 500) || ' other' || (x % 13) FROM s");
-  const CIndexHeader d = Findex("Kept", t, {{"body", {}}}, 3);
+      "SELECT x, 'word' || (x % 500) || ' other' || (x % 13) || ' third' || (x % 7) || "
+      "' fourth' || (x % 11) FROM s");
+  const CIndexHeader d = Findex("Kept", t, {{"body", {}}}, 7);
   CIndexHeader first = d;
   CPiFIndex(home_.Defs()).BuildRowFindex(first, true);
   const std::string sdx = test::ReadFile(Indexes() + "KEPT.sdx");
@@ -217,10 +219,20 @@ TEST_P(BuildSortTestSqlite, AFailureInEitherThreadEndsTheBuildWithItsErrorAndKee
       // The row loop meets a key it cannot read, halfway through the rows.
       {"reader", [&] { Run("UPDATE " + t + " SET id = 'twenty' WHERE id = 20000"); },
        "Could not convert column value into appropriate type"},
+      // The writer fails early, while the merge beside it still has more
+      // entries than wait for the writer: the merge must stop too.
+      {"writer",
+       [&] {
+         Run("UPDATE " + t + " SET id = 20000 WHERE id = 'twenty'");
+         FindexLimits few_bytes;
+         few_bytes.max_fst_bytes = 100000;
+         SetFindexLimitsForTesting(few_bytes);
+       },
+       "32-bit positions"},
       // Runs cannot be written: the work folder is gone.
       {"sorter",
        [&] {
-         Run("UPDATE " + t + " SET id = 20000 WHERE id = 'twenty'");
+         SetFindexLimitsForTesting({});
          fs::remove_all(home_.WorkData());
        },
        "WorkData"},

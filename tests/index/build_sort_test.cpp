@@ -13,6 +13,7 @@
 #include "base/exception.h"
 #include "index/findex_files_writer.h"
 #include "index/findex_writer.h"
+#include "index/sorted_entries.h"
 #include "index/word_sort.h"
 #include "support/findex_decoder.h"
 #include "support/test_sources.h"
@@ -61,14 +62,20 @@ class BuildSortTest : public test::SourceRowsTest {
     return d;
   }
 
-  // Sorts with method and writes the findex of the sorted file; returns the
-  // runs the sort wrote.
+  // Sorts with method and writes the findex: runs as a build does, the
+  // writer beside the final merge; the two-way merge through its sorted
+  // file. Returns the runs the sort wrote.
   int64_t Build(CIndexHeader d, EntrySortingThread::Method method) {
     CPiSort sort(home_.Defs());
-    sort.SetSortMethodForTesting(method);
-    MFile sorted;
-    sort.SortFindexTable(d, sorted);
-    CPiFIndex(home_.Defs()).BuildFromSorted(d, sorted, true);
+    if (method == EntrySortingThread::Method::Runs) {
+      sort.SortFindexRows(d);
+      CPiFIndex(home_.Defs()).BuildFromSorted(d, sort.Merged(), true);
+    } else {
+      sort.SetSortMethodForTesting(method);
+      MFile sorted;
+      sort.SortFindexTable(d, sorted);
+      CPiFIndex(home_.Defs()).BuildFromSorted(d, sorted, true);
+    }
     return sort.LastPhases().run_count;
   }
 

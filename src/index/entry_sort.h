@@ -2,10 +2,12 @@
 // word sort and the order sort. Memory-bounded: entries are gathered in one
 // buffer of the memory budget and sorted in place in pieces as it fills (so
 // sorting keeps pace with a producer on another thread); a full buffer is
-// merged from its pieces and written as a run. At the end the runs (and the last one, still in memory) are
-// merged k ways at a time, so each entry is written and read about twice
-// however large the input. Only when more than kMergeWays runs exist does a
-// pass merge groups of them into longer runs first.
+// merged from its pieces and written as a run. At the end the runs (and the
+// last one, still in memory) are merged k ways at a time into a sorted file,
+// or into a queue for a reader on another thread, so each entry is written
+// and read at most about twice however large the input. Only when more than
+// kMergeWays runs exist does a pass merge groups of them into longer runs
+// first.
 //
 // The sorted file orders entries by value, then key; entries that compare
 // equal keep the order in which they were added (a run keeps it by its buffer

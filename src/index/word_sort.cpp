@@ -149,9 +149,8 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
   const auto type = static_cast<VALUE_TYPE>(plan.findex_type);
   const CColumnSet set = CColumnSet::FromGeneralFlags(definition.GeneralFlags);
   const SortEntryLayout layout(set.Width(), type);
-  std::optional<EntrySortingThread>& sorting = sorting_;
-  sorting.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted,
-                  sorted != nullptr ? method_ : EntrySortingThread::Method::Runs);
+  sorting_.emplace(defs_, layout, CEntrySort::ConfiguredMemoryBytes(), sorted,
+                   sorted != nullptr ? method_ : EntrySortingThread::Method::Runs);
   merged_.emplace(layout, [this](std::vector<uint8_t>& block) { return PopMerged(block); });
   // Text is split on a thread of its own; other values are written here.
   std::optional<WordSplittingThread> splitting;
@@ -159,10 +158,10 @@ int64_t CPiSort::WriteFindexRows(CShareDatabase& database, CIndexHeader& definit
   if (IsText(type)) {
     std::vector<int32_t> weights;
     for (const IndexedColumn& column : plan.columns) weights.push_back(column.weight);
-    splitting.emplace(defs_, WordPipelineOptions::FromHeader(definition), sorting->Queue(), layout,
+    splitting.emplace(defs_, WordPipelineOptions::FromHeader(definition), sorting_->Queue(), layout,
                       set, std::move(weights));
   } else {
-    writer.emplace(sorting->Queue(), layout, set);
+    writer.emplace(sorting_->Queue(), layout, set);
   }
   DocumentTexts documents(defs_);
   // Indexed text is read whole: a word anywhere in a value must be found.

@@ -14,8 +14,6 @@
 namespace qm {
 namespace {
 
-using test::Found;
-
 // One record: block 0 of a 4,096-byte block file. Used count first (32-bit),
 // then the fields: ints 4 bytes, texts a 16-bit length and the bytes, dates
 // 16 bytes, all little-endian.
@@ -98,19 +96,8 @@ TEST_F(RepositoryTest, MembersOpenTheirCollectorsFindexesInMemberOrder) {
   EXPECT_EQ(view.GetFindexType(), 2);
   EXPECT_THROW(view.GetFindex(3), CGiRepositoryException);
   EXPECT_THROW(view.GetFindex(-1), CGiRepositoryException);
-
-  // One word over the three findexes: one key-sorted array; key 2 is in two.
-  struct WordCase {
-    std::u16string word;
-    std::vector<int32_t> keys;
-  };
-  for (const WordCase& c : std::vector<WordCase>{{u"RIVER", {1, 2, 3, 5}},
-                                                 {u"LAKE", {2}},
-                                                 {u"*", {1, 2, 2, 3, 5, 7}}}) {
-    const Found found = Text("Lib", c.word);
-    EXPECT_EQ(found.error, "");
-    EXPECT_EQ(found.keys, c.keys) << Utf16ToUtf8(c.word);
-  }
+  // What a search over the members finds is SearchEvaluationTest's
+  // RepositoriesSearchEveryMemberFindexAsOne.
 
   struct NameCase {
     std::string name;
@@ -138,11 +125,9 @@ TEST_F(RepositoryTest, NamesThatAreNotPlainOrResolveToNothingAreRefused) {
   };
   const std::vector<RefusalCase> cases = {
       {"../Groups", "Invalid findex name"},
-      {"a/b", "Invalid findex name"},
       {"Lib./x", "Invalid findex name"},
       {"Lib.", "Invalid collector name"},
       {".x", "Invalid repository name"},
-      {std::string(200, 'n'), "Invalid findex name"},
       {"Empty", "Repository Empty has no members"},
       {"Liar", "ReadRepository"},
       {"NoSuchFindex", "NOSUCHFINDEX.sdx"},

@@ -8,12 +8,14 @@
 #include <string>
 #include <vector>
 
+#include "search/record_writer.h"
 #include "search/search_fixture.h"
 
 namespace qm {
 namespace {
 
 using KeyList = std::vector<int32_t>;
+using test::RecordWriter;
 
 class SearchEvaluationTest : public test::SearchFixture {
  protected:
@@ -230,39 +232,6 @@ TEST_F(SearchEvaluationTest, AddOnFindexesJoinTheirFindexInKeyOrder) {
   }
 }
 
-// A record file: block 0 of a 4,096-byte block file, the used byte count
-// first, then the fields (ints 4 bytes, texts a 16-bit length and the bytes,
-// dates 16 bytes), little-endian.
-class RecordWriter {
- public:
-  RecordWriter& Int(int32_t v) {
-    for (int i = 0; i < 4; ++i)
-      bytes_.push_back(static_cast<char>(static_cast<uint32_t>(v) >> (8 * i)));
-    return *this;
-  }
-  RecordWriter& Text(const std::string& text) {
-    bytes_.push_back(static_cast<char>(text.size() & 0xFF));
-    bytes_.push_back(static_cast<char>(text.size() >> 8));
-    bytes_ += text;
-    return *this;
-  }
-  RecordWriter& Date() {
-    bytes_ += std::string("\xE8\x07\x01\x00\x02\x00", 6) + std::string(10, '\0');
-    return *this;
-  }
-  std::string Block() const {
-    std::string block(4096, '\0');
-    const auto used = static_cast<uint32_t>(bytes_.size());
-    for (int i = 0; i < 4; ++i)
-      block[static_cast<std::size_t>(i)] = static_cast<char>(used >> (8 * i));
-    block.replace(6, bytes_.size() - 6, bytes_.substr(6));
-    return block;
-  }
-
- private:
-  std::string bytes_ = std::string(6, '\0');
-};
-
 TEST_F(SearchEvaluationTest, RepositoriesSearchEveryMemberFindexAsOne) {
   const std::string folder = GroupFolder() + "Repositories/";
   std::filesystem::create_directories(folder);
@@ -275,7 +244,7 @@ TEST_F(SearchEvaluationTest, RepositoriesSearchEveryMemberFindexAsOne) {
                                        {"C2", 9, {"3, 'river'", "7, 'sea'"}},
                                        {"C3", 12, {"5, 'river'", "2, 'river'"}}};
   RecordWriter repository;
-  repository.Int(1).Text("x").Date().Text("y").Text("").Date().Int(7).Int(3);
+  repository.Int(1).Text("x").Date(2024, 1, 2).Text("y").Text("").Date(2024, 1, 2).Int(7).Int(3);
   for (const Member& m : members) {
     const std::string table = std::string("lib_") + m.collector;
     std::vector<std::string> statements{"create table " + table + " (id integer, t varchar(20))"};
@@ -286,7 +255,7 @@ TEST_F(SearchEvaluationTest, RepositoriesSearchEveryMemberFindexAsOne) {
                   " COLUMNS t KEY id"),
               "");
     RecordWriter collector;
-    collector.Int(1).Text("a").Date().Date().Text("b").Text("c").Int(m.number);
+    collector.Int(1).Text("a").Date(2024, 1, 2).Date(2024, 1, 2).Text("b").Text("c").Int(m.number);
     collector.Text("").Int(5).Int(0).Int(0).Int(0).Text("s1").Text("s2");
     test::WriteFile(folder + "LIB_" + m.collector + ".col", collector.Block());
     repository.Text(m.collector).Int(5);

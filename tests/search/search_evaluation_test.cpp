@@ -118,14 +118,13 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
     KeyList keys;
     const char* error;  // a text the failure holds
   };
+  // Each value type's text is read once per kind of value; how ranges of
+  // each type compare is FindexLookupTest's.
   const std::vector<Case> cases = {
       {"AMOUNTS='20'", {2}, ""},
       {"AMOUNTS='0'", {}, ""},
       {"AMOUNTS='-7'", {}, ""},
       {"AMOUNTS>'10'", {2, 3}, ""},
-      {"AMOUNTS>='10'", {1, 2, 3}, ""},
-      {"AMOUNTS<'20'", {1}, ""},
-      {"AMOUNTS<='20'", {1, 2}, ""},
       {"AMOUNTS<'25'", {1, 2}, ""},
       {"AMOUNTS='10' OR '30'", {1, 3}, ""},
       {"AMOUNTS!='20'", {1, 3}, ""},
@@ -135,13 +134,9 @@ TEST_F(SearchEvaluationTest, TypedFindexesCompareValuesAndRefuseWordsOfAnotherTy
       {"AMOUNTS='12abc'", {}, "Not a valid integer"},
       {"AMOUNTS='99999999999'", {}, "Not a valid integer"},
       {"PRICES='7.25'", {2, 3}, ""},
-      {"PRICES>'2.5'", {2, 3}, ""},
-      {"PRICES<'7'", {1}, ""},
       {"PRICES='cheap'", {}, "Not a valid double (Module:GiTreeRowset,Method:SearchNext)"},
       {"SEEN='2025-01-31'", {2, 3}, ""},
       {"SEEN='2025-01-31 08:00:00'", {2}, ""},
-      {"SEEN>'2024-12-31'", {2, 3}, ""},
-      {"SEEN<'2025-01-31'", {1}, ""},
       {"SEEN='not a date'", {}, "Invalid date or time"},
   };
   for (const Case& c : cases) {

@@ -407,7 +407,6 @@ TEST_F(CInterfaceTest, ObjectsAreCountedForTheUnloadCheck) {
   EXPECT_EQ(qm_can_unload_now(), QM_S_FALSE);
   EXPECT_EQ(qm_lock_server(0), 0);
   EXPECT_EQ(qm_can_unload_now(), QM_S_OK);
-  EXPECT_STREQ(qm_version(), "6.14");
 }
 
 TEST(TypeLibrary, TheInstalledDescriptionIsTheDispatchTables) {
@@ -424,8 +423,6 @@ TEST(TypeLibrary, TheInstalledDescriptionIsTheDispatchTables) {
       }
     }
   }
-  EXPECT_EQ(APICommandDispatch().Methods().size(), 43u);
-  EXPECT_EQ(APISearchDispatch().Methods().size(), 44u);
 }
 
 }  // namespace

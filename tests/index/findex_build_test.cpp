@@ -103,10 +103,6 @@ TEST_F(FindexBuildTest, BuildsFromTableRows) {
   definition.GeneralFlags = 7;  // scores, positions, default separators
   definition.LanguageFlags = 0;
   CPiFIndex(defs_).BuildRowFindex(definition, true);
-  const std::vector<test::Word> words = {{std::string("ALPHA"), {{1, 1, 1}}},
-                                         {std::string("BETA"), {{1, 1, 2}, {2, 1, 1}, {2, 1, 3}}},
-                                         {std::string("GAMMA"), {{2, 1, 2}}}};
-  EXPECT_EQ(Decode("DOCS").words, words);
   EXPECT_EQ(definition.KeyCount, 3);
   EXPECT_EQ(definition.SortMax, 3);
   const std::string sdx = Bytes("DOCS.sdx");

@@ -62,11 +62,6 @@ TEST_P(FindexEndToEndTest, CreateFindexWithWeightsAndTagsAndEveryInformationValu
       {"МОСКВА", {{3, 1, 2}}}};
   EXPECT_EQ(words, expected);
 
-  VARIANT_BOOL exists = VARIANT_FALSE;
-  ASSERT_EQ(command_->FindexExist(T("BOOKS"), T("PUBLIC"), &exists), S_OK);
-  EXPECT_EQ(exists, VARIANT_TRUE);
-  EXPECT_TRUE(fs::exists(IndexFolder() + "BOOKS.sdx"));
-
   EXPECT_EQ(Info("Books", idxTableName), books);
   EXPECT_EQ(Info("Books", idxColumnNames), "body,title");
   EXPECT_EQ(Info("Books", idxKeyName), "id");

@@ -34,13 +34,10 @@ TEST(Language, ShippedStopWordsAreUpperCasedAndTestedOnTheWordAsCut) {
 TEST(Language, UnknownLanguagesAndStepsOtherLanguagesCannotTakeAreRefused) {
   CLanguage language(ShippedLanguageFolder());
   language.LoadLanguage(lngEnglish, CLanguage::kUseStopWords);
-  const std::pair<int32_t, std::string> refused[] = {
-      {0, "Unknown language 0 (Module:Language,Method:LoadLanguage)"}};
-  for (const auto& [id, text] : refused) {
-    EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(id, 0); }), text)) << id;
-    EXPECT_FALSE(language.IsLoaded());
-    EXPECT_FALSE(language.IsStopWord(u"THE"));
-  }
+  EXPECT_TRUE(Contains(FailureText([&] { language.LoadLanguage(0, 0); }),
+                       "Unknown language 0 (Module:Language,Method:LoadLanguage)"));
+  EXPECT_FALSE(language.IsLoaded());
+  EXPECT_FALSE(language.IsStopWord(u"THE"));
   const std::pair<int32_t, std::string> other[] = {
       {CLanguage::kUseStemming,
        "Stemming is only supported for specific languages, not for other languages "

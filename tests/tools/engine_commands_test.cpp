@@ -86,9 +86,6 @@ TEST_F(EngineCommandsTest, EngineErrorsGoToStandardErrorAndExitOne) {
   EXPECT_EQ(r.status, 1);
   EXPECT_EQ(r.err,
             "quillmere exec: Command not recognised (Module:PiStartPoint,Method:ExecuteW)\n");
-
-
-
   // A group whose folder is missing is the engine's error, at the first use.
   r = Host({"--group", "Nowhere", "exec", "SET GROUP Nowhere"});
   EXPECT_EQ(r.status, 1);
@@ -154,9 +151,7 @@ TEST_F(EngineCommandsTest, BackgroundExecPrintsProgressThenTheJobsError) {
   EXPECT_EQ(r.out.substr(r.out.size() - 5), "100%\n") << r.out;
   EXPECT_EQ(r.out.find('\r'), std::string::npos);
   EXPECT_EQ(r.err.rfind("quillmere exec: ", 0), 0u) << r.err;
-
 }
-
 
 TEST_F(EngineCommandsTest, AFindexOrOrderThatIsNotThereIsNamedNotItsFile) {
   const fs::path empty = dir_.Path() + "never-initialised";

@@ -43,16 +43,13 @@ class SearchCommandsTest : public ::testing::Test {
     ASSERT_EQ(Host({"options", "set", "index-general", "igoSupportScore=1"}).status, 0);
     connect_ = Database("books.db", {
         "create table books (id integer, title varchar(60), year integer, genre varchar(20), "
-        "price real, note varchar(40), added timestamp, cover blob)",
+        "price real, note varchar(40), cover blob)",
         "insert into books values"
-        " (1, 'River fish', 1990, 'nature', 12.5, 'first', '2024-01-11 10:00:00', X'00010203'),"
-        " (2, 'The river and the river bank', 1985, 'nature', 20, NULL,"
-        "  '2024-02-12 10:00:00', NULL),"
-        " (3, 'Mountain', 1985, 'travel', NULL, 'river' || char(9) || 'view',"
-        "  '2024-03-13 10:00:00', NULL),"
-        " (4, 'Quiet river', 2001, 'fiction', 8.25, 'Ünïcode', '2024-04-14 10:00:00', NULL),"
-        " (5, 'Fish market', 2001, 'travel', 15, 'line' || char(10) || 'two',"
-        "  '2024-01-11 09:00:00', NULL)"});
+        " (1, 'River fish', 1990, 'nature', 12.5, 'first', X'00010203'),"
+        " (2, 'The river and the river bank', 1985, 'nature', 20, NULL, NULL),"
+        " (3, 'Mountain', 1985, 'travel', NULL, 'river' || char(9) || 'view', NULL),"
+        " (4, 'Quiet river', 2001, 'fiction', 8.25, 'Ünïcode', NULL),"
+        " (5, 'Fish market', 2001, 'travel', 15, 'line' || char(10) || 'two', NULL)"});
     for (const char* statement :
          {"CREATE FINDEX Books ON TABLE books COLUMNS title KEY id",
           "CREATE FINDEX Scored ON TABLE books COLUMNS title:CONTENT_WEIGHT=5,note KEY id",
@@ -60,8 +57,7 @@ class SearchCommandsTest : public ::testing::Test {
           // Named after the table, so that the SQL order clause BOOKS.YEAR is
           // one the database understands.
           "CREATE ORDER books ON TABLE books COLUMNS year,price KEY id",
-          "CREATE ORDER Genres ON TABLE books COLUMNS genre KEY id",
-          "CREATE ORDER Added ON TABLE books COLUMNS added KEY id"}) {
+          "CREATE ORDER Genres ON TABLE books COLUMNS genre KEY id"}) {
       const Result r = Host({"--connect", connect_, "exec", "--quiet", statement});
       ASSERT_EQ(r.status, 0) << statement << "\n" << r.err;
     }
@@ -94,18 +90,12 @@ TEST_F(SearchCommandsTest, SearchPrintsTheTotalAndTheKeysSqlOrRowsOfItsWindow) {
            {{kRiver, "--count", "0"}, "3\n()\n"},
            // The shell may split a statement: its words are joined again.
            {{"SELECT", "id", "FROM", "books", "WHERE", "[Books='fish']"}, "2\n(1,5)\n"},
-           {{"SELECT id FROM books WHERE [Books='river bank']"}, "1\n(2)\n"},
-           {{"SELECT id FROM books WHERE [Books='bank river']"}, "0\n()\n"},
-           {{"SELECT id FROM books WHERE [Books='rive*']"}, "3\n(1,2,4)\n"},
-           {{"SELECT id FROM books WHERE [Books='river' AND NOT Books='fish']"}, "2\n(2,4)\n"},
-           {{"SELECT id FROM books WHERE [Years>='1990']"}, "3\n(1,4,5)\n"},
            {{kRiver, "--sql"}, "SELECT id,title FROM books WHERE id in (1,2,4) \n"},
            {{kRiver, "--sql", "--order-by", "KEY DESC", "--count", "2"},
             "SELECT id,title FROM books WHERE id in (4,2)  order by id DESC\n"},
            {{"SELECT id FROM books WHERE [Books='zebra']", "--sql"},
             "SELECT id FROM books WHERE 1=2 \n"},
            {{kEveryBook, "--keys", "--order-by", "books.year DESC,KEY"}, "(4,5,1,2,3)\n"},
-           {{kEveryBook, "--keys", "--order-by", "books.price"}, "(4,1,5,2,3)\n"},
        }) {
     const Result r = Host(With({"search"}, c.args));
     EXPECT_EQ(r.status, 0) << c.args[0] << "\n" << r.err;
@@ -257,12 +247,8 @@ TEST_F(SearchCommandsTest, ValidatePrintsTheConditionAsParsedOrTheParseError) {
            {"Books='red wine' OR Books = beer", 0, "'RED WINE' OR 'BEER'\n"},
            // Stop words of the findex's language go: THE.
            {"(Books='x' OR Books='y') AND Books='the river'", 0, "('X' OR 'Y') AND 'RIVER'\n"},
-           {"Books='river' AND NOT Books='fish'", 0, "'RIVER' OPERATOR 'FISH'\n"},
            {"NOT Books='fish'", 0, "'*' OPERATOR 'FISH'\n"},
            {"(Books='fish'", 1, "Parentheses do not match"},
-           {"Books='fish", 1, "Illegal or missing end of phrase character"},
-           {"Books 'fish'", 1, "Missing character"},
-           {"Books='red' OR 'wine'", 1, "Illegal character outside phrase"},
            {"   ", 1, "Empty search condition"},
        }) {
     const Result r = Host({"validate", "SELECT id FROM books WHERE [" + c.condition + "]"});
@@ -287,15 +273,10 @@ TEST_F(SearchCommandsTest, WordsListsAFindexsWordsByFilterAndWindow) {
            // Stop words (THE, AND) are not in the findex.
            {{"Books"}, 0, "BANK\nFISH\nMARKET\nMOUNTAIN\nQUIET\nRIVER\n"},
            {{"books", "--filter", "m*"}, 0, "MARKET\nMOUNTAIN\n"},
-           {{"Books", "--filter", "?i*"}, 0, "FISH\nRIVER\n"},
            {{"Books", "--start", "2", "--count", "3"}, 0, "FISH\nMARKET\nMOUNTAIN\n"},
            {{"Books", "--start", "6"}, 0, "RIVER\n"},
            {{"Books", "--start", "7"}, 0, ""},
            {{"Books", "--count", "0"}, 0, ""},
-           // Accents are removed as the findex was built: UNICODE.
-           {{"Scored", "--filter", "*i*"},
-            0,
-            "FIRST\nFISH\nLINE\nMOUNTAIN\nQUIET\nRIVER\nUNICODE\nVIEW\n"},
        }) {
     const Result r = Host(With({"words"}, c.args));
     EXPECT_EQ(r.status, c.status) << c.args.back() << "\n" << r.err;
@@ -313,26 +294,15 @@ TEST_F(SearchCommandsTest, GroupsPrintEachValueOfTheColumnWithItsRows) {
   struct Case {
     std::string order_by, column, out;
   };
-  // A date/time reads as its date: year * 65536 + month * 256 + day.
-  const auto day = [](int month, int day) {
-    return std::to_string(2024 * 65536 + month * 256 + day);
-  };
   for (const Case& c : std::vector<Case>{
            {"books.year", "books.year", "1985\t2\n1990\t1\n2001\t2\n"},
            {"books.year DESC", "BOOKS.YEAR", "2001\t2\n1990\t1\n1985\t2\n"},
-           // Doubles read as whole numbers; a key without a value last.
-           {"books.price", "books.price", "8\t1\n12\t1\n15\t1\n20\t1\n2147483647\t1\n"},
-           // A text column reads as the place of the text among the column's
+           // Grouped by the first column, the runs of the second do not show. A
+           // text column reads as the place of the text among the column's
            // texts: fiction 0, nature 1, travel 2.
-           {"genres.genre", "genres.genre", "0\t1\n1\t2\n2\t2\n"},
-           // Grouped by the first column, the runs of the second do not show.
            {"books.year,genres.genre", "books.year", "1985\t2\n1990\t1\n2001\t2\n"},
            {"books.year,genres.genre", "genres.genre", "1\t1\n2\t1\n1\t1\n0\t1\n2\t1\n"},
            {"KEY", "KEY", "1\t1\n2\t1\n3\t1\n4\t1\n5\t1\n"},
-           // Groups are of whole date/times: two times of one day, two groups.
-           {"added.added", "added.added",
-            day(1, 11) + "\t1\n" + day(1, 11) + "\t1\n" + day(2, 12) + "\t1\n" + day(3, 13) +
-                "\t1\n" + day(4, 14) + "\t1\n"},
        }) {
     const Result r =
         Host({"groups", kEveryBook, "--order-by", c.order_by, "--column", c.column});
@@ -359,9 +329,7 @@ TEST_F(SearchCommandsTest, EngineErrorsExitOneUsageErrorsTwoAndEveryCommandHasHe
            // Option names are case-sensitive.
            {{"search", kRiver, "--option", "score_return=2"}, "Unknown Option score_return"},
            {{"search", kRiver, "--order-by", "SCORE SIDEWAYS"}, "Invalid sort direction"},
-           {{"search", kRiver, "--order-by", "nope.year"}, "NOPE.sri"},
            {{"search", "SELECT id FROM books WHERE [Nope='x']"}, "NOPE.sdx"},
-           {{"search", "SELECT id FROM books WHERE Books='x'"}, "Empty search condition"},
        }) {
     const Result r = Host(c.args);
     EXPECT_EQ(r.status, 1) << c.args.back() << "\n" << r.err;

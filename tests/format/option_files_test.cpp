@@ -68,6 +68,15 @@ class OptionTest : public CommandFixture {
   }
 };
 
+TEST_F(OptionTest, NewObjectStartsWithTheDocumentedDefaults) {
+  EXPECT_EQ(All(),
+            "ilo=2\nilo=0\nilo=0\nilo=1\nilo=0\nilo=1\n"
+            "igo=0\nigo=0\nigo=\nigo=0\nigo=1\nigo=1\nigo=1\nigo=0\nigo=0\n"
+            "iuo=0\niuo=0\niuo=0\n"
+            "ogo=\nogo=0\nogo=0\n"
+            "ouo=0\nouo=0\nouo=0\n");
+}
+
 TEST_F(OptionTest, SavedDefaultsComeBackInANewObjectWithTheirFileLayout) {
   SetEverything();
   ASSERT_EQ(command_->SaveDefaultIndexOptions(), S_OK) << LastError();

@@ -14,7 +14,8 @@ namespace qm::test {
 class RecordWriter {
  public:
   RecordWriter& Int(int32_t v) {
-    for (int i = 0; i < 4; ++i) bytes_.push_back(static_cast<char>((static_cast<uint32_t>(v) >> (8 * i)) & 0xFF));
+    const auto u = static_cast<uint32_t>(v);
+    for (int i = 0; i < 4; ++i) bytes_.push_back(static_cast<char>((u >> (8 * i)) & 0xFF));
     return *this;
   }
   RecordWriter& Short(uint16_t v) {
@@ -34,7 +35,7 @@ class RecordWriter {
   std::string Block() const {
     std::string block(4096, '\0');
     const auto used = static_cast<uint32_t>(bytes_.size());
-    for (int i = 0; i < 4; ++i) block[static_cast<std::size_t>(i)] = static_cast<char>((used >> (8 * i)) & 0xFF);
+    for (std::size_t i = 0; i < 4; ++i) block[i] = static_cast<char>((used >> (8 * i)) & 0xFF);
     block.replace(6, bytes_.size() - 6, bytes_.substr(6));
     return block;
   }

@@ -83,11 +83,13 @@ struct Timing {
 
 qm::COrderInfo Definition(const char* name, std::initializer_list<const char*> columns) {
   qm::COrderInfo d;
-  d.OrderName = name;
-  d.TableName = "t";
-  d.KeyColumn = "id";
+  // Moved in rather than assigned from literals: GCC 12 warns falsely
+  // (-Wrestrict) about the inlined literal assignments in Release builds.
+  d.OrderName = std::string(name);
+  d.TableName = std::string("t");
+  d.KeyColumn = std::string("id");
   d.GeneralFlags = 1;  // ignore case
-  d.IgnoreChars = u"-";
+  d.IgnoreChars = std::u16string(u"-");
   for (const char* c : columns) d.Columns.push_back(qm::OrderColumn{c, {}});
   return d;
 }

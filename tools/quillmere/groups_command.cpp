@@ -2,6 +2,7 @@
 // its result, collects the groups of equal values and prints each group's
 // value of C and its number of rows.
 #include <cstdio>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -37,12 +38,10 @@ void PrintHelp() {
 int RunGroups(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("groups");
   ArgumentList list;
-  const std::string error = SplitArguments(args, {"--order-by", "--column"}, {}, list);
-  if (list.help && error.empty()) {
-    PrintHelp();
-    return kExitOk;
+  if (const std::optional<int> done =
+          session.TakeArguments(args, {"--order-by", "--column"}, {}, kUsage, PrintHelp, list)) {
+    return *done;
   }
-  if (!error.empty()) return session.Usage(error, kUsage);
   const std::string statement = list.JoinedWords();
   if (statement.empty()) return session.Usage("no statement given", kUsage);
   if (!list.Has("--order-by") || !list.Has("--column")) {

@@ -142,4 +142,18 @@ int HostSession::Usage(std::string_view message, std::string_view usage) {
   return kExitUsage;
 }
 
+std::optional<int> HostSession::TakeArguments(const std::vector<std::string>& args,
+                                              std::initializer_list<std::string_view> with_value,
+                                              std::initializer_list<std::string_view> flags,
+                                              std::string_view usage, void (*print_help)(),
+                                              ArgumentList& list) {
+  const std::string error = SplitArguments(args, with_value, flags, list);
+  if (!error.empty()) return Usage(error, usage);
+  if (list.help) {
+    print_help();
+    return kExitOk;
+  }
+  return std::nullopt;
+}
+
 }  // namespace qm::cli

@@ -5,10 +5,14 @@
 #pragma once
 
 #include <deque>
+#include <initializer_list>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
+#include "argument_list.h"
 #include "command_registry.h"
 #include "config/global_defs.h"
 #include "quillmere/api_command.h"
@@ -52,6 +56,14 @@ class HostSession {
   int Fail(std::string text);
   // Prints "quillmere NAME: message" to standard error and returns kExitUsage.
   int Usage(std::string_view message, std::string_view usage);
+  // Splits args into list (SplitArguments). Returns the exit status when the
+  // command ends here: kExitOk after print_help for --help, kExitUsage after
+  // the usage error; nothing when it goes on.
+  std::optional<int> TakeArguments(const std::vector<std::string>& args,
+                                   std::initializer_list<std::string_view> with_value,
+                                   std::initializer_list<std::string_view> flags,
+                                   std::string_view usage, void (*print_help)(),
+                                   ArgumentList& list);
 
  private:
   bool Require(bool there, std::string_view what, std::string_view name);

@@ -160,12 +160,10 @@ bool Skipped(std::string_view line) {
 int RunRepl(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("repl");
   ArgumentList list;
-  const std::string error = SplitArguments(args, {}, {"--json"}, list);
-  if (list.help && error.empty()) {
-    PrintHelp();
-    return kExitOk;
+  if (const std::optional<int> done =
+          session.TakeArguments(args, {}, {"--json"}, kUsage, PrintHelp, list)) {
+    return *done;
   }
-  if (!error.empty()) return session.Usage(error, kUsage);
   if (!list.words.empty()) return session.Usage("unexpected argument: " + list.words[0], kUsage);
   const bool json = list.Has("--json");
 

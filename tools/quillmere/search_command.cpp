@@ -66,14 +66,11 @@ struct NumericOption {
 int RunSearch(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("search");
   ArgumentList list;
-  const std::string error =
-      SplitArguments(args, {"--start", "--count", "--order-by", "--option"},
-                     {"--total", "--keys", "--sql", "--key-file", "--rows"}, list);
-  if (list.help && error.empty()) {
-    PrintHelp();
-    return kExitOk;
+  if (const std::optional<int> done = session.TakeArguments(
+          args, {"--start", "--count", "--order-by", "--option"},
+          {"--total", "--keys", "--sql", "--key-file", "--rows"}, kUsage, PrintHelp, list)) {
+    return *done;
   }
-  if (!error.empty()) return session.Usage(error, kUsage);
 
   Output output = Output::TotalAndKeys;
   std::optional<int32_t> start;

@@ -1,6 +1,7 @@
 // quillmere validate STATEMENT: parses a search statement without searching
 // and prints its condition as the engine reads it.
 #include <cstdio>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -33,12 +34,10 @@ void PrintHelp() {
 int RunValidate(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("validate");
   ArgumentList list;
-  const std::string error = SplitArguments(args, {}, {}, list);
-  if (list.help && error.empty()) {
-    PrintHelp();
-    return kExitOk;
+  if (const std::optional<int> done =
+          session.TakeArguments(args, {}, {}, kUsage, PrintHelp, list)) {
+    return *done;
   }
-  if (!error.empty()) return session.Usage(error, kUsage);
   const std::string statement = list.JoinedWords();
   if (statement.empty()) return session.Usage("no statement given", kUsage);
   if (!session.OpenSearch(global)) return kExitError;

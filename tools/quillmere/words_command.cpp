@@ -43,12 +43,10 @@ void PrintHelp() {
 int RunWords(const GlobalOptions& global, const std::vector<std::string>& args) {
   HostSession session("words");
   ArgumentList list;
-  const std::string error = SplitArguments(args, {"--filter", "--start", "--count"}, {}, list);
-  if (list.help && error.empty()) {
-    PrintHelp();
-    return kExitOk;
+  if (const std::optional<int> done = session.TakeArguments(
+          args, {"--filter", "--start", "--count"}, {}, kUsage, PrintHelp, list)) {
+    return *done;
   }
-  if (!error.empty()) return session.Usage(error, kUsage);
   if (list.words.size() != 1) return session.Usage("expected one findex name", kUsage);
   const std::string& findex = list.words[0];
   int32_t start = 1;

@@ -170,10 +170,7 @@ FindexWriteCounts WriteFiles(CIndexHeader& header, SortedEntries& sorted, const 
 FindexWriteCounts WriteFindexFiles(CIndexHeader& header, MFile& sorted, const std::string& sdx_path,
                                    const std::string& fst_path, const FindexLimits& limits,
                                    std::function<void(int32_t rows)> batch_observer) {
-  SortedFileEntries entries(
-      SortEntryLayout(CColumnSet::FromGeneralFlags(header.GeneralFlags).Width(),
-                      static_cast<VALUE_TYPE>(header.FindexType)),
-      sorted);
+  SortedFileEntries entries(header, sorted);
   return WriteFindexFiles(header, entries, sdx_path, fst_path, limits, std::move(batch_observer));
 }
 

@@ -7,7 +7,6 @@
 #include "index/findex_file_set.h"
 #include "index/findex_files_writer.h"
 #include "index/sorted_entries.h"
-#include "format/column_set.h"
 #include "index/word_sort.h"
 #include "platform/file_io.h"
 #include "format/bfile.h"
@@ -173,10 +172,7 @@ void CPiFIndex::BuildRowFindex(CIndexHeader& definition, bool rebuild) {
 }
 
 void CPiFIndex::BuildFromSorted(CIndexHeader& definition, MFile& sorted, bool rebuild) {
-  SortedFileEntries entries(
-      SortEntryLayout(CColumnSet::FromGeneralFlags(definition.GeneralFlags).Width(),
-                      static_cast<VALUE_TYPE>(definition.FindexType)),
-      sorted);
+  SortedFileEntries entries(definition, sorted);
   BuildFromSorted(definition, entries, rebuild);
 }
 

@@ -1,8 +1,14 @@
 #include "index/sorted_entries.h"
 
 #include "base/exception_family.h"
+#include "format/column_set.h"
 
 namespace qm {
+
+SortedFileEntries::SortedFileEntries(const CIndexHeader& header, MFile& file)
+    : SortedFileEntries(SortEntryLayout(CColumnSet::FromGeneralFlags(header.GeneralFlags).Width(),
+                                        static_cast<VALUE_TYPE>(header.FindexType)),
+                        file) {}
 
 const uint8_t* SortedBlockEntries::Fetch(std::size_t& size) {
   while (at_ == block_.size()) {

@@ -9,6 +9,7 @@
 #include <functional>
 #include <vector>
 
+#include "format/index_header.h"
 #include "format/mfile.h"
 #include "format/sort_entry.h"
 #include "format/sort_stream.h"
@@ -51,6 +52,9 @@ class SortedFileEntries final : public SortedEntries {
   SortedFileEntries(const SortEntryLayout& layout, MFile& file) : reader_(layout) {
     reader_.Start(file);
   }
+  // The entries of a findex's sorted file: the layout of header's column
+  // set and findex type.
+  SortedFileEntries(const CIndexHeader& header, MFile& file);
 
  private:
   const uint8_t* Fetch(std::size_t& size) override { return reader_.Next(size); }
